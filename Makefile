@@ -1,0 +1,65 @@
+# Wraps CMake. `make test` installs what is missing, builds and runs the suite.
+BUILD_DIR      ?= build
+ASAN_BUILD_DIR ?= build-asan
+BENCH_BUILD_DIR ?= build-bench
+BUILD_TYPE     ?= RelWithDebInfo
+JOBS           ?= $(shell nproc 2>/dev/null || echo 2)
+WERROR         ?= OFF
+PREFIX         ?= /usr/local
+
+# Debian packages the build needs.
+PACKAGES := cmake make g++ pkg-config rapidjson-dev libicu-dev libgtest-dev libbenchmark-dev
+
+CMAKE_FLAGS := -DCMAKE_BUILD_TYPE=$(BUILD_TYPE) -DSTYLES_WARNINGS_AS_ERRORS=$(WERROR)
+
+.PHONY: all deps configure build test test-asan bench demo install format clean
+
+all: build
+
+# Installs the missing Debian packages: one apt-get update, then one install.
+deps:
+	@missing=""; \
+	for p in $(PACKAGES); do \
+	  dpkg-query -W -f='$${Status}' $$p 2>/dev/null | grep -q "install ok installed" || missing="$$missing $$p"; \
+	done; \
+	if [ -n "$$missing" ]; then \
+	  echo "Installing:$$missing"; \
+	  apt-get update && DEBIAN_FRONTEND=noninteractive apt-get install -y --no-install-recommends $$missing; \
+	else \
+	  echo "All build dependencies are installed."; \
+	fi
+
+configure: deps
+	cmake -S . -B $(BUILD_DIR) $(CMAKE_FLAGS)
+
+build: configure
+	cmake --build $(BUILD_DIR) -j $(JOBS)
+
+test: build
+	cd $(BUILD_DIR) && ctest --output-on-failure -j $(JOBS)
+
+# The whole suite under AddressSanitizer, LeakSanitizer and UBSan.
+test-asan: deps
+	cmake -S . -B $(ASAN_BUILD_DIR) -DCMAKE_BUILD_TYPE=Debug -DSTYLES_SANITIZE=ON \
+	  -DSTYLES_WARNINGS_AS_ERRORS=$(WERROR)
+	cmake --build $(ASAN_BUILD_DIR) -j $(JOBS)
+	cd $(ASAN_BUILD_DIR) && ASAN_OPTIONS=detect_leaks=1:strict_string_checks=1 \
+	  UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1 ctest --output-on-failure -j $(JOBS)
+
+bench: deps
+	cmake -S . -B $(BENCH_BUILD_DIR) -DCMAKE_BUILD_TYPE=Release -DSTYLES_BUILD_BENCHMARKS=ON \
+	  -DSTYLES_BUILD_TESTS=OFF
+	cmake --build $(BENCH_BUILD_DIR) -j $(JOBS)
+	for b in $(BENCH_BUILD_DIR)/benchmarks/Benchmark*; do [ -x "$$b" ] && "$$b" || exit 1; done
+
+demo: build
+	$(BUILD_DIR)/examples/WordProcessorDemo
+
+install: build
+	cmake --install $(BUILD_DIR) --prefix $(PREFIX)
+
+format:
+	find Engines tests benchmarks examples -name '*.h' -o -name '*.cpp' | xargs clang-format -i
+
+clean:
+	rm -rf $(BUILD_DIR) $(ASAN_BUILD_DIR) $(BENCH_BUILD_DIR)
