@@ -1,0 +1,186 @@
+#include <ZelPlatform/ZelString.h>
+
+#include <unicode/uchar.h>
+#include <unicode/ustring.h>
+#include <unicode/utf16.h>
+#include <unicode/utf8.h>
+
+#include <cassert>
+#include <cstdarg>
+#include <cstdint>
+#include <cstdio>
+#include <limits>
+
+namespace ZelPlatform {
+namespace detail {
+namespace {
+
+constexpr char32_t kReplacementCharacter = 0xFFFD;
+
+inline bool IsAscii(char32_t c) noexcept { return c < 0x80; }
+
+inline char32_t FoldAscii(char32_t c) noexcept {
+  return (c >= 'A' && c <= 'Z') ? c + ('a' - 'A') : c;
+}
+
+inline int Sign(int value) noexcept { return value < 0 ? -1 : (value > 0 ? 1 : 0); }
+
+// Full case-folded comparison of two UTF-16 texts in code point order.
+int FoldedCompare(std::u16string_view a, std::u16string_view b) {
+  // ICU takes 32-bit lengths; texts beyond 2 GiB code units are not supported.
+  assert(a.size() <= static_cast<std::size_t>(std::numeric_limits<int32_t>::max()));
+  assert(b.size() <= static_cast<std::size_t>(std::numeric_limits<int32_t>::max()));
+  UErrorCode status = U_ZERO_ERROR;
+  const int result = u_strCaseCompare(a.data(), static_cast<int32_t>(a.size()), b.data(),
+                                      static_cast<int32_t>(b.size()),
+                                      U_FOLD_CASE_DEFAULT | U_COMPARE_CODE_POINT_ORDER, &status);
+  if (U_FAILURE(status)) {
+    // Only an argument error can get here; fall back to exact code unit order.
+    const int exact = a.compare(b);
+    return Sign(exact);
+  }
+  return Sign(result);
+}
+
+// UTF-8 to UTF-16; ill-formed sequences become U+FFFD.
+std::u16string Utf8ToUtf16(std::string_view text) {
+  std::u16string result;
+  result.reserve(text.size());
+  const auto* bytes = reinterpret_cast<const uint8_t*>(text.data());
+  const auto length = static_cast<int64_t>(text.size());
+  int64_t i = 0;
+  while (i < length) {
+    UChar32 c;
+    U8_NEXT(bytes, i, length, c);
+    if (c < 0)
+      c = kReplacementCharacter;
+    if (U_IS_BMP(c)) {
+      result.push_back(static_cast<char16_t>(c));
+    } else {
+      result.push_back(U16_LEAD(c));
+      result.push_back(U16_TRAIL(c));
+    }
+  }
+  return result;
+}
+
+} // namespace
+
+int CompareNoCaseUtf16(std::u16string_view a, std::u16string_view b) {
+  // ASCII letters fold to ASCII and nothing else changes in ASCII, so an ASCII
+  // prefix can be decided here; any non-ASCII unit (which may fold to ASCII,
+  // like U+212A KELVIN SIGN to "k") sends the remaining suffixes to ICU.
+  const std::size_t common = a.size() < b.size() ? a.size() : b.size();
+  std::size_t i = 0;
+  for (; i < common; ++i) {
+    const char32_t ca = a[i];
+    const char32_t cb = b[i];
+    if (!IsAscii(ca) || !IsAscii(cb))
+      return FoldedCompare(a.substr(i), b.substr(i));
+    const char32_t fa = FoldAscii(ca);
+    const char32_t fb = FoldAscii(cb);
+    if (fa != fb)
+      return fa < fb ? -1 : 1;
+  }
+  if (a.size() == b.size())
+    return 0;
+  // No character folds to nothing, so the longer text is greater.
+  return a.size() < b.size() ? -1 : 1;
+}
+
+int CompareNoCaseUtf8(std::string_view a, std::string_view b) {
+  const std::size_t common = a.size() < b.size() ? a.size() : b.size();
+  std::size_t i = 0;
+  for (; i < common; ++i) {
+    const char32_t ca = static_cast<unsigned char>(a[i]);
+    const char32_t cb = static_cast<unsigned char>(b[i]);
+    if (!IsAscii(ca) || !IsAscii(cb))
+      return CompareNoCaseUtf16(Utf8ToUtf16(a.substr(i)), Utf8ToUtf16(b.substr(i)));
+    const char32_t fa = FoldAscii(ca);
+    const char32_t fb = FoldAscii(cb);
+    if (fa != fb)
+      return fa < fb ? -1 : 1;
+  }
+  if (a.size() == b.size())
+    return 0;
+  return a.size() < b.size() ? -1 : 1;
+}
+
+std::pair<std::size_t, std::size_t> TrimBoundsUtf16(std::u16string_view text) {
+  const char16_t* units = text.data();
+  const auto length = static_cast<int64_t>(text.size());
+  int64_t first = 0;
+  while (first < length) {
+    int64_t next = first;
+    UChar32 c;
+    U16_NEXT(units, next, length, c);
+    if (!u_isUWhiteSpace(c))
+      break;
+    first = next;
+  }
+  int64_t last = length;
+  while (last > first) {
+    int64_t previous = last;
+    UChar32 c;
+    U16_PREV(units, first, previous, c);
+    if (!u_isUWhiteSpace(c))
+      break;
+    last = previous;
+  }
+  return {static_cast<std::size_t>(first), static_cast<std::size_t>(last)};
+}
+
+std::pair<std::size_t, std::size_t> TrimBoundsUtf8(std::string_view text) {
+  const auto* bytes = reinterpret_cast<const uint8_t*>(text.data());
+  const auto length = static_cast<int64_t>(text.size());
+  int64_t first = 0;
+  while (first < length) {
+    int64_t next = first;
+    UChar32 c;
+    U8_NEXT(bytes, next, length, c);
+    if (c < 0 || !u_isUWhiteSpace(c))
+      break;
+    first = next;
+  }
+  int64_t last = length;
+  while (last > first) {
+    // Step back over at most three continuation bytes, then decode forward:
+    // the character counts only if it ends exactly at `last`.
+    int64_t previous = last - 1;
+    while (previous > first && last - previous < 4 && U8_IS_TRAIL(bytes[previous]))
+      --previous;
+    int64_t next = previous;
+    UChar32 c;
+    U8_NEXT(bytes, next, length, c);
+    if (next != last || c < 0 || !u_isUWhiteSpace(c))
+      break;
+    last = previous;
+  }
+  return {static_cast<std::size_t>(first), static_cast<std::size_t>(last)};
+}
+
+std::string FormatAscii(const char* format, ...) {
+  char buffer[128];
+  va_list arguments;
+  va_start(arguments, format);
+  va_list copy;
+  va_copy(copy, arguments);
+  const int needed = std::vsnprintf(buffer, sizeof buffer, format, arguments);
+  va_end(arguments);
+  std::string result;
+  if (needed < 0) {
+    va_end(copy);
+    return result;
+  }
+  if (static_cast<std::size_t>(needed) < sizeof buffer) {
+    result.assign(buffer, static_cast<std::size_t>(needed));
+  } else {
+    result.resize(static_cast<std::size_t>(needed));
+    std::vsnprintf(result.data(), result.size() + 1, format, copy);
+  }
+  va_end(copy);
+  return result;
+}
+
+} // namespace detail
+} // namespace ZelPlatform

@@ -1,0 +1,178 @@
+#include <ZelPref/ConversionPolicy.h>
+
+#include <charconv>
+#include <climits>
+#include <cmath>
+#include <string>
+#include <string_view>
+#include <system_error>
+
+namespace ZelPref {
+
+namespace Detail {
+
+const char* BadConversion::what() const noexcept { return "ZelPref::Detail::BadConversion"; }
+
+} // namespace Detail
+
+namespace {
+
+[[noreturn]] void Fail() { throw Detail::BadConversion(); }
+
+bool IsAsciiSpace(char c) noexcept {
+  return c == ' ' || c == '\t' || c == '\n' || c == '\r' || c == '\f' || c == '\v';
+}
+
+bool IsDigit(char c) noexcept { return c >= '0' && c <= '9'; }
+
+// The text without surrounding ASCII white space, narrowed to 8 bits; throws
+// when any character is outside ASCII (no number or flag form uses one).
+std::string TrimmedAscii(const ZelStringT<char16_t>& text) {
+  std::u16string_view view = text;
+  while (!view.empty() && view.front() < 0x80 && IsAsciiSpace(static_cast<char>(view.front())))
+    view.remove_prefix(1);
+  while (!view.empty() && view.back() < 0x80 && IsAsciiSpace(static_cast<char>(view.back())))
+    view.remove_suffix(1);
+  std::string ascii;
+  ascii.reserve(view.size());
+  for (const char16_t c : view) {
+    if (c >= 0x80)
+      Fail();
+    ascii.push_back(static_cast<char>(c));
+  }
+  return ascii;
+}
+
+// The text that std::from_chars should read (it takes "-" but not "+"), with
+// the index of the first character after the sign.
+std::string_view ForFromChars(std::string_view text, std::size_t& unsignedStart) {
+  unsignedStart = 0;
+  if (!text.empty() && text.front() == '+')
+    text.remove_prefix(1);
+  else if (!text.empty() && text.front() == '-')
+    unsignedStart = 1;
+  return text;
+}
+
+// A finite number in decimal or exponent form; the part after the sign must
+// start with a digit or a point so that "inf", "nan" and doubled signs fail.
+double ParseNumber(std::string_view text) {
+  std::size_t start = 0;
+  text = ForFromChars(text, start);
+  if (text.size() <= start || !(IsDigit(text[start]) || text[start] == '.'))
+    Fail();
+  double value = 0;
+  const char* end = text.data() + text.size();
+  const std::from_chars_result result =
+      std::from_chars(text.data(), end, value, std::chars_format::general);
+  if (result.ec != std::errc() || result.ptr != end || !std::isfinite(value))
+    Fail();
+  return value;
+}
+
+// True for an optional sign followed by decimal digits only.
+bool IsPlainInteger(std::string_view text) {
+  std::size_t start = 0;
+  text = ForFromChars(text, start);
+  if (text.size() <= start)
+    return false;
+  for (std::size_t i = start; i < text.size(); ++i)
+    if (!IsDigit(text[i]))
+      return false;
+  return true;
+}
+
+ZelStringT<char16_t> Widen(const char* first, const char* last) {
+  return ZelStringT<char16_t>(std::u16string(first, last));
+}
+
+} // namespace
+
+ConversionPolicy::~ConversionPolicy() = default;
+
+NumberConversionPolicy::~NumberConversionPolicy() = default;
+
+ZelStringT<char16_t> NumberConversionPolicy::ToText(const ZelUtils::Any& value) const {
+  const double* number = value.GetIf<double>();
+  if (!number || !std::isfinite(*number))
+    Fail();
+  char buffer[64];
+  const std::to_chars_result result = std::to_chars(buffer, buffer + sizeof buffer, *number);
+  if (result.ec != std::errc())
+    Fail();
+  return Widen(buffer, result.ptr);
+}
+
+ZelUtils::Any NumberConversionPolicy::FromText(const ZelStringT<char16_t>& text) const {
+  return ZelUtils::Any(ParseNumber(TrimmedAscii(text)));
+}
+
+IntegerConversionPolicy::~IntegerConversionPolicy() = default;
+
+ZelStringT<char16_t> IntegerConversionPolicy::ToText(const ZelUtils::Any& value) const {
+  const int* number = value.GetIf<int>();
+  if (!number)
+    Fail();
+  char buffer[16];
+  const std::to_chars_result result = std::to_chars(buffer, buffer + sizeof buffer, *number);
+  if (result.ec != std::errc())
+    Fail();
+  return Widen(buffer, result.ptr);
+}
+
+ZelUtils::Any IntegerConversionPolicy::FromText(const ZelStringT<char16_t>& text) const {
+  const std::string ascii = TrimmedAscii(text);
+  if (IsPlainInteger(ascii)) {
+    // Read digits exactly, so that values near the limits are not rounded.
+    std::size_t start = 0;
+    const std::string_view digits = ForFromChars(ascii, start);
+    int value = 0;
+    const char* end = digits.data() + digits.size();
+    const std::from_chars_result result = std::from_chars(digits.data(), end, value);
+    if (result.ec != std::errc() || result.ptr != end)
+      Fail();
+    return ZelUtils::Any(value);
+  }
+  // Other forms ("1e+06" as printed by "%g", "2.0") must name a whole number.
+  const double number = ParseNumber(ascii);
+  if (std::trunc(number) != number || number < static_cast<double>(INT_MIN) ||
+      number > static_cast<double>(INT_MAX))
+    Fail();
+  return ZelUtils::Any(static_cast<int>(number));
+}
+
+BooleanConversionPolicy::~BooleanConversionPolicy() = default;
+
+ZelStringT<char16_t> BooleanConversionPolicy::ToText(const ZelUtils::Any& value) const {
+  const bool* flag = value.GetIf<bool>();
+  if (!flag)
+    Fail();
+  return ZelStringT<char16_t>(*flag ? u"1" : u"0");
+}
+
+ZelUtils::Any BooleanConversionPolicy::FromText(const ZelStringT<char16_t>& text) const {
+  std::string ascii = TrimmedAscii(text);
+  for (char& c : ascii)
+    if (c >= 'A' && c <= 'Z')
+      c = static_cast<char>(c - 'A' + 'a');
+  if (ascii == "1" || ascii == "true")
+    return ZelUtils::Any(true);
+  if (ascii == "0" || ascii == "false")
+    return ZelUtils::Any(false);
+  Fail();
+}
+
+TextConversionPolicy::~TextConversionPolicy() = default;
+
+ZelStringT<char16_t> TextConversionPolicy::ToText(const ZelUtils::Any& value) const {
+  const ZelStringT<char16_t>* text = value.GetIf<ZelStringT<char16_t>>();
+  if (!text)
+    Fail();
+  return *text;
+}
+
+ZelUtils::Any TextConversionPolicy::FromText(const ZelStringT<char16_t>& text) const {
+  return ZelUtils::Any(text);
+}
+
+} // namespace ZelPref

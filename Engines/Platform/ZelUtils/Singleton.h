@@ -1,0 +1,17 @@
+// ZelUtils::Singleton<T>: one instance of T per process, created on first use
+// (thread-safe) and destroyed when the program or library is unloaded.
+// Instantiate Get() inside the one library that owns T so that every caller
+// shares the same instance.
+#pragma once
+
+namespace ZelUtils {
+
+template <class T> class Singleton {
+public:
+  static T& Get() {
+    static T instance;
+    return instance;
+  }
+};
+
+} // namespace ZelUtils

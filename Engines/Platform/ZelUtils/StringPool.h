@@ -1,0 +1,78 @@
+// ZelUtils::StringPool interns UTF-16 texts: equal texts get the same entry,
+// and entries never move or die while the pool lives. PooledString<Pool> is a
+// one-word handle to an entry of the pool that Pool::Get() returns; handles
+// compare, order and hash by entry identity, never by text.
+#pragma once
+
+#include <ZelPlatform/Export.h>
+#include <ZelPlatform/ZelString.h>
+
+#include <cstddef>
+#include <deque>
+#include <functional>
+#include <memory>
+#include <shared_mutex>
+#include <string_view>
+#include <unordered_map>
+
+namespace ZelUtils {
+
+class ZEL_API StringPool {
+public:
+  using Entry = ZelStringT<char16_t>;
+
+  StringPool();
+  ~StringPool();
+  StringPool(const StringPool&) = delete;
+  StringPool& operator=(const StringPool&) = delete;
+
+  // The entry for `text`, inserted on first use. Safe from several threads;
+  // the returned pointer stays valid as long as the pool.
+  const Entry* AddString(std::u16string_view text);
+  // The entry of the empty text, without a lookup.
+  const Entry* GetEmptyEntry() const noexcept { return m_empty; }
+  std::size_t GetSize() const;
+
+private:
+  mutable std::shared_mutex m_mutex;
+  std::deque<Entry> m_entries;                                   // a deque never moves its elements
+  std::unordered_map<std::u16string_view, const Entry*> m_index; // views into m_entries
+  const Entry* m_empty = nullptr;
+};
+
+// A handle to a pooled text of Pool, whose static Get() returns a StringPool.
+template <class Pool> class PooledString {
+public:
+  static const PooledString Empty;
+
+  PooledString() noexcept : m_entry(Pool::Get().GetEmptyEntry()) {}
+  PooledString(const ZelStringT<char16_t>& text) : m_entry(Pool::Get().AddString(text)) {}
+  PooledString(const char16_t* text)
+      : m_entry(Pool::Get().AddString(text ? std::u16string_view(text) : std::u16string_view())) {}
+
+  // A copy of the pooled text.
+  ZelStringT<char16_t> ToString() const { return *m_entry; }
+  // The pooled text itself; valid as long as the pool.
+  const ZelStringT<char16_t>& GetString() const noexcept { return *m_entry; }
+  std::u16string_view GetView() const noexcept { return m_entry->GetView(); }
+  std::size_t getHash() const noexcept { return std::hash<const void*>()(m_entry); }
+
+  friend bool operator==(PooledString a, PooledString b) noexcept { return a.m_entry == b.m_entry; }
+  friend bool operator!=(PooledString a, PooledString b) noexcept { return a.m_entry != b.m_entry; }
+  // Identity order: the order of the entries' addresses, not of the texts.
+  friend bool operator<(PooledString a, PooledString b) noexcept {
+    return std::less<const void*>()(a.m_entry, b.m_entry);
+  }
+  friend bool operator>(PooledString a, PooledString b) noexcept { return b < a; }
+  friend bool operator<=(PooledString a, PooledString b) noexcept { return !(b < a); }
+  friend bool operator>=(PooledString a, PooledString b) noexcept { return !(a < b); }
+
+private:
+  const ZelStringT<char16_t>* m_entry;
+};
+
+} // namespace ZelUtils
+
+template <class Pool> struct std::hash<ZelUtils::PooledString<Pool>> {
+  std::size_t operator()(ZelUtils::PooledString<Pool> key) const noexcept { return key.getHash(); }
+};
