@@ -103,8 +103,8 @@ class Any {
 
   template <class T>
   static constexpr bool
-      kInline = sizeof(T) <= kInlineSize &&
-                alignof(T) <= kInlineAlign&& std::is_nothrow_move_constructible<T>::value;
+      kInline = (sizeof(T) <= kInlineSize) &&
+                (alignof(T) <= kInlineAlign) && std::is_nothrow_move_constructible<T>::value;
 
 public:
   Any() noexcept {}

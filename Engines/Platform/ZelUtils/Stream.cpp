@@ -1,0 +1,164 @@
+#include <ZelUtils/Stream.h>
+
+#include <unicode/ustring.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdint>
+#include <cstring>
+#include <utility>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+namespace ZelUtils {
+
+Stream::Impl::~Impl() = default;
+
+std::size_t Stream::Read(void* buffer, std::size_t size) {
+  if (!IsReadable() || size == 0 || buffer == nullptr)
+    return 0;
+  return m_impl->Read(buffer, size);
+}
+
+bool Stream::Write(const void* data, std::size_t size) {
+  if (!IsWritable())
+    return false;
+  if (size == 0)
+    return true;
+  return data != nullptr && m_impl->Write(data, size);
+}
+
+bool Stream::Flush() { return m_impl && m_impl->Flush(); }
+
+namespace {
+
+// The UTF-8 form of a path for the operating system; false when the path
+// cannot name a file (unpaired surrogates, an embedded NUL, empty).
+bool PathToUtf8(const ZelStringT<char16_t>& path, std::string& out) {
+  if (path.IsEmpty() || path.GetLength() > INT32_MAX / 3 ||
+      path.GetView().find(u'\0') != std::u16string_view::npos)
+    return false;
+  // Every UTF-16 unit becomes at most three UTF-8 bytes.
+  out.assign(path.GetLength() * 3, '\0');
+  int32_t length = 0;
+  UErrorCode error = U_ZERO_ERROR;
+  u_strToUTF8(out.data(), static_cast<int32_t>(out.size()), &length,
+              reinterpret_cast<const UChar*>(path.data()), static_cast<int32_t>(path.GetLength()),
+              &error);
+  if (U_FAILURE(error))
+    return false;
+  out.resize(static_cast<std::size_t>(length));
+  return true;
+}
+
+class FileImpl final : public Stream::Impl {
+public:
+  FileImpl(int descriptor, bool writable) noexcept
+      : m_descriptor(descriptor), m_writable(writable) {}
+  ~FileImpl() override { ::close(m_descriptor); }
+  FileImpl(const FileImpl&) = delete;
+  FileImpl& operator=(const FileImpl&) = delete;
+
+  std::size_t Read(void* buffer, std::size_t size) override {
+    auto* bytes = static_cast<char*>(buffer);
+    std::size_t done = 0;
+    while (done < size) {
+      const ssize_t count = ::read(m_descriptor, bytes + done, size - done);
+      if (count < 0 && errno == EINTR)
+        continue;
+      if (count <= 0)
+        break;
+      done += static_cast<std::size_t>(count);
+    }
+    return done;
+  }
+
+  bool Write(const void* data, std::size_t size) override {
+    const auto* bytes = static_cast<const char*>(data);
+    while (size > 0) {
+      const ssize_t count = ::write(m_descriptor, bytes, size);
+      if (count < 0 && errno == EINTR)
+        continue;
+      if (count <= 0)
+        return false;
+      bytes += count;
+      size -= static_cast<std::size_t>(count);
+    }
+    return true;
+  }
+
+  // Writes go straight to the file; nothing is buffered here.
+  bool Flush() override { return true; }
+  bool IsReadable() const noexcept override { return !m_writable; }
+  bool IsWritable() const noexcept override { return m_writable; }
+
+private:
+  int m_descriptor;
+  bool m_writable;
+};
+
+Stream OpenFile(const ZelStringT<char16_t>& path, bool forWriting) {
+  std::string nativePath;
+  if (!PathToUtf8(path, nativePath))
+    return Stream();
+  const int flags = forWriting ? O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC : O_RDONLY | O_CLOEXEC;
+  int descriptor;
+  do {
+    descriptor = ::open(nativePath.c_str(), flags, 0666);
+  } while (descriptor < 0 && errno == EINTR);
+  if (descriptor < 0)
+    return Stream();
+  // A folder opens for reading on some systems but yields no bytes.
+  struct stat status;
+  if (::fstat(descriptor, &status) != 0 || S_ISDIR(status.st_mode)) {
+    ::close(descriptor);
+    return Stream();
+  }
+  return Stream(std::make_shared<FileImpl>(descriptor, forWriting));
+}
+
+class MemoryImpl final : public Stream::Impl {
+public:
+  explicit MemoryImpl(std::string bytes) noexcept : m_bytes(std::move(bytes)) {}
+
+  std::size_t Read(void* buffer, std::size_t size) override {
+    const std::size_t count = std::min(size, m_bytes.size() - m_readPosition);
+    std::memcpy(buffer, m_bytes.data() + m_readPosition, count);
+    m_readPosition += count;
+    return count;
+  }
+  bool Write(const void* data, std::size_t size) override {
+    m_bytes.append(static_cast<const char*>(data), size);
+    return true;
+  }
+  bool Flush() override { return true; }
+  bool IsReadable() const noexcept override { return true; }
+  bool IsWritable() const noexcept override { return true; }
+
+  const std::string& GetBytes() const noexcept { return m_bytes; }
+
+private:
+  std::string m_bytes;
+  std::size_t m_readPosition = 0;
+};
+
+} // namespace
+
+Stream FileStream::Create(const ZelStringT<char16_t>& path) { return OpenFile(path, true); }
+
+Stream FileStream::Open(const ZelStringT<char16_t>& path) { return OpenFile(path, false); }
+
+Stream MemoryStream::Create() { return Stream(std::make_shared<MemoryImpl>(std::string())); }
+
+Stream MemoryStream::FromBytes(std::string bytes) {
+  return Stream(std::make_shared<MemoryImpl>(std::move(bytes)));
+}
+
+std::string MemoryStream::GetBytes(const Stream& stream) {
+  const auto* memory = dynamic_cast<const MemoryImpl*>(stream.GetImpl());
+  return memory ? memory->GetBytes() : std::string();
+}
+
+} // namespace ZelUtils
