@@ -1,0 +1,935 @@
+#include <Styles/Style.h>
+
+#include <Styles/StyleCategory.h>
+#include <Styles/StyleManager.h>
+#include <Styles/StyleProperty.h>
+#include <Styles/StyleSheet.h>
+#include <Styles/StyleUtilities.h>
+
+#include <Json/Json.h>
+
+#include <algorithm>
+#include <exception>
+#include <memory>
+#include <typeinfo>
+
+namespace Styles {
+
+ZelUtils::StringPool& StringPool::Get() {
+  static ZelUtils::StringPool pool;
+  return pool;
+}
+
+// Fixed member names of a style's JSON object.
+static const ZelStringT<char16_t> k_strPropertyInherits(u"inherits");
+static const ZelStringT<char16_t> k_strExternalID(u"id");
+static const ZelStringT<char16_t> k_strExternalName(u"original");
+
+namespace {
+
+// Owner keys collected on an owner-based lookup: two live inline, deeper
+// nesting spills into a vector.
+class OwnerKeyStack {
+public:
+  void Push(const PropertyKey& key) {
+    if (m_size < kInline)
+      m_inline[m_size] = key;
+    else
+      m_spill.push_back(key);
+    ++m_size;
+  }
+  std::size_t Size() const noexcept { return m_size; }
+  const PropertyKey& operator[](std::size_t i) const noexcept {
+    return i < kInline ? m_inline[i] : m_spill[i - kInline];
+  }
+
+private:
+  static constexpr std::size_t kInline = 2;
+  PropertyKey m_inline[kInline];
+  std::vector<PropertyKey> m_spill;
+  std::size_t m_size = 0;
+};
+
+// The keys of a style's own values, taken before a loop that may edit them.
+std::vector<PropertyKey> OwnKeys(const PropertyMap& properties) {
+  std::vector<PropertyKey> keys;
+  keys.reserve(properties.size());
+  for (const PropertyMap::Entry& entry : properties)
+    keys.push_back(entry.first);
+  return keys;
+}
+
+} // namespace
+
+// ---------------------------------------------------------------------------
+// PropertyMap
+
+bool PropertyMap::Insert(const PropertyKey& key, ZelUtils::Any&& value) {
+  const std::size_t i = LowerBound(key);
+  if (i < m_entries.size() && m_entries[i].first == key)
+    return false;
+  m_entries.emplace(m_entries.begin() + static_cast<std::ptrdiff_t>(i), key, std::move(value));
+  return true;
+}
+
+bool PropertyMap::Erase(const PropertyKey& key) {
+  const std::size_t i = LowerBound(key);
+  if (i == m_entries.size() || m_entries[i].first != key)
+    return false;
+  m_entries.erase(m_entries.begin() + static_cast<std::ptrdiff_t>(i));
+  return true;
+}
+
+// ---------------------------------------------------------------------------
+// Construction, copying, identity
+
+Style::Style() = default;
+
+Style::Style(Style* parent, const PropertyKey& categoryName) : m_parent(parent) {
+  SetCategory(categoryName);
+}
+
+Style::Style(const Style& other) { *this = other; }
+
+Style::Style(Style&& other) { *this = std::move(other); }
+
+Style& Style::operator=(const Style& other) {
+  if (&other == this)
+    return *this;
+  DestroyOwnValues();
+  m_parent = other.m_parent;
+  m_category = other.m_category;
+  m_externalID = other.m_externalID;
+  m_externalName = other.m_externalName;
+  for (const PropertyMap::Entry& entry : other.m_properties) {
+    BaseStyleProperty* behaviour = FindBehaviour(entry.first);
+    if (!behaviour)
+      continue;
+    // Stored even when empty, unlike SetProperty.
+    m_properties.Insert(entry.first,
+                        behaviour->MovePropertyData(this, ZelUtils::Any(entry.second)));
+  }
+  return *this;
+}
+
+Style& Style::operator=(Style&& other) {
+  if (&other == this)
+    return *this;
+  DestroyOwnValues();
+  // Copied, not moved: the source keeps its links, category and strings.
+  m_parent = other.m_parent;
+  m_category = other.m_category;
+  m_externalID = other.m_externalID;
+  m_externalName = other.m_externalName;
+  m_properties.Swap(other.m_properties);
+  RepairSubstyleOwnerPointers();
+  return *this;
+}
+
+Style::~Style() {
+  for (PropertyMap::Entry& entry : m_properties)
+    if (BaseStyleProperty* behaviour = FindBehaviour(entry.first))
+      behaviour->DestroyPropertyData(entry.second);
+}
+
+void Style::DestroyOwnValues() {
+  for (PropertyMap::Entry& entry : m_properties)
+    if (BaseStyleProperty* behaviour = FindBehaviour(entry.first))
+      behaviour->DestroyPropertyData(entry.second);
+  m_properties.Clear();
+}
+
+BaseStyleProperty* Style::FindBehaviour(const PropertyKey& key) const {
+  return m_category ? m_category->GetStyleProperty(key) : nullptr;
+}
+
+const ZelUtils::Any& Style::DefaultValue(const PropertyKey& key) const {
+  if (!m_category)
+    throw std::exception();
+  return m_category->GetDefaultValue(key);
+}
+
+void Style::SetCategory(const PropertyKey& name) {
+  try {
+    if (const std::shared_ptr<StyleCategory>* category = GetStyleManager().FindCategory(name))
+      m_category = *category;
+  } catch (...) {
+    // The style keeps its previous category.
+  }
+}
+
+PropertyKey Style::GetCategoryName() const noexcept {
+  return m_category ? m_category->GetKey() : PropertyKey::Empty;
+}
+
+void Style::SetExternalID(const ZelStringT<char16_t>& id) {
+  m_externalID = id;
+  if (GetCategoryName() != StyleCategoryName)
+    return;
+  for (const PropertyMap::Entry& entry : m_properties)
+    if (Style* substyle = GetSubstyle(entry.first, false))
+      substyle->m_externalID = id;
+}
+
+void Style::SetExternalName(const ZelStringT<char16_t>& name) {
+  m_externalName = name;
+  if (GetCategoryName() != StyleCategoryName)
+    return;
+  for (const PropertyMap::Entry& entry : m_properties)
+    if (Style* substyle = GetSubstyle(entry.first, false))
+      substyle->m_externalName = name;
+}
+
+void Style::RepairSubstyleOwnerPointers() {
+  for (PropertyMap::Entry& entry : m_properties)
+    if (BaseStyleProperty* behaviour = FindBehaviour(entry.first))
+      behaviour->SetOwner(entry.second, this, entry.first);
+}
+
+void Style::SwapData(Style& other) {
+  std::swap(m_category, other.m_category);
+  std::swap(m_parent, other.m_parent);
+  m_properties.Swap(other.m_properties);
+  std::swap(m_externalID, other.m_externalID);
+  std::swap(m_externalName, other.m_externalName);
+  RepairSubstyleOwnerPointers();
+  other.RepairSubstyleOwnerPointers();
+}
+
+bool Style::operator==(const Style& other) const {
+  if (m_category != other.m_category || m_parent != other.m_parent)
+    return false;
+  if (m_externalID.Compare(other.m_externalID, kCompareCaseSensitive) != 0 ||
+      m_externalName.Compare(other.m_externalName, kCompareCaseSensitive) != 0)
+    return false;
+  if (m_properties.size() != other.m_properties.size())
+    return false;
+  for (std::size_t i = 0; i < m_properties.size(); ++i) {
+    const PropertyMap::Entry& mine = m_properties[i];
+    const PropertyMap::Entry& theirs = other.m_properties[i];
+    if (mine.first != theirs.first)
+      return false;
+    const BaseStyleProperty* behaviour = FindBehaviour(mine.first);
+    if (!behaviour || !behaviour->IsEqual(mine.second, theirs.second))
+      return false;
+  }
+  return true;
+}
+
+bool Style::operator<(const Style& other) const {
+  if (m_category != other.m_category)
+    return std::less<const StyleCategory*>()(m_category.get(), other.m_category.get());
+  if (m_parent != other.m_parent)
+    return std::less<const Style*>()(m_parent, other.m_parent);
+  if (const int c = m_externalID.Compare(other.m_externalID, kCompareCaseSensitive))
+    return c < 0;
+  if (const int c = m_externalName.Compare(other.m_externalName, kCompareCaseSensitive))
+    return c < 0;
+  if (m_properties.size() != other.m_properties.size())
+    return m_properties.size() < other.m_properties.size();
+  for (std::size_t i = 0; i < m_properties.size(); ++i) {
+    const PropertyMap::Entry& mine = m_properties[i];
+    const PropertyMap::Entry& theirs = other.m_properties[i];
+    if (mine.first != theirs.first)
+      return mine.first < theirs.first;
+    // A key without behaviour counts as equal here, unlike operator==.
+    const BaseStyleProperty* behaviour = FindBehaviour(mine.first);
+    if (behaviour && !behaviour->IsEqual(mine.second, theirs.second))
+      return behaviour->IsLess(mine.second, theirs.second);
+  }
+  return false;
+}
+
+bool Style::substyle_less_including_owner_based_inheritance(const Style& other) const {
+  if (!(*this == other))
+    return *this < other;
+  if (m_parent)
+    return false;
+  // Both sides resolve through this style's owner key, deliberately.
+  const auto resolve = [this](const Style& style) -> const Style* {
+    if (!style.m_owner)
+      return nullptr;
+    const ZelUtils::Any& value = style.m_owner->GetInheritedProperty(m_ownerPropertyKey);
+    return value.IsTypeCompatible<Style*>() ? value.Get<Style*>() : nullptr;
+  };
+  return std::less<const Style*>()(resolve(*this), resolve(other));
+}
+
+// ---------------------------------------------------------------------------
+// Lookup
+
+const ZelUtils::Any& Style::GetProperty(const PropertyKey& key) const {
+  if (const ZelUtils::Any* own = m_properties.Find(key))
+    return *own;
+  return GetInheritedProperty(key);
+}
+
+const ZelUtils::Any& Style::GetInheritedProperty(const PropertyKey& key) const {
+  const Style* current = this;
+  for (;;) {
+    while (const Style* parent = current->m_parent) {
+      if (const ZelUtils::Any* own = parent->m_properties.Find(key))
+        return *own;
+      current = parent;
+    }
+    if (!current->m_owner)
+      return current->DefaultValue(key);
+
+    // Owner-based inheritance: climb to the first owner with a parent,
+    // remembering the owner keys on the way.
+    OwnerKeyStack keys;
+    const Style* climber = current;
+    const Style* ownerWithParent = nullptr;
+    while (climber->m_owner) {
+      keys.Push(climber->m_ownerPropertyKey);
+      climber = climber->m_owner;
+      if (climber->m_parent) {
+        ownerWithParent = climber;
+        break;
+      }
+    }
+    if (!ownerWithParent)
+      return current->DefaultValue(key);
+
+    // Descend from that owner's parent along the keys, nearest-to-owner first.
+    const Style* counterpart = ownerWithParent->m_parent;
+    for (std::size_t i = keys.Size(); i-- > 0 && counterpart;) {
+      const ZelUtils::Any& value = counterpart->GetProperty(keys[i]);
+      if (!value.IsTypeCompatible<Style*>())
+        throw std::bad_cast();
+      counterpart = value.Get<Style*>();
+    }
+    if (!counterpart)
+      return current->DefaultValue(key);
+    if (const ZelUtils::Any* own = counterpart->m_properties.Find(key))
+      return *own;
+    current = counterpart;
+  }
+}
+
+bool Style::GetProperty(const PropertyKey& key, ZelUtils::Any& out) const {
+  const BaseStyleProperty* behaviour = FindBehaviour(key);
+  if (!behaviour)
+    return false;
+  const ZelUtils::Any& value = GetProperty(key);
+  if (&value == &behaviour->GetDefaultValue())
+    return false;
+  out = value;
+  return true;
+}
+
+bool Style::GetInheritedProperty(const PropertyKey& key, ZelUtils::Any& out) const {
+  const ZelUtils::Any& value = GetInheritedProperty(key);
+  const BaseStyleProperty* behaviour = FindBehaviour(key);
+  if (behaviour && &value == &behaviour->GetDefaultValue())
+    return false;
+  out = value;
+  return true;
+}
+
+bool Style::GetOverrideProperty(const PropertyKey& key, ZelUtils::Any& out) const {
+  const ZelUtils::Any* own = m_properties.Find(key);
+  if (!own)
+    return false;
+  out = *own;
+  return true;
+}
+
+bool Style::DoesOverrideProperty(const PropertyKey& key) const noexcept {
+  return m_properties.Contains(key);
+}
+
+Style* Style::GetSubstyle(const PropertyKey& key, bool inherited) const {
+  if (inherited) {
+    const ZelUtils::Any& value = GetProperty(key);
+    if (!value.IsTypeCompatible<Style*>())
+      throw std::bad_cast();
+    return value.Get<Style*>();
+  }
+  const ZelUtils::Any* own = m_properties.Find(key);
+  if (!own)
+    return nullptr;
+  Style* const* substyle = own->GetIf<Style*>();
+  return substyle ? *substyle : nullptr;
+}
+
+Style* Style::GetSubstyleAndCreateIfMissing(const PropertyKey& key,
+                                            const PropertyKey& categoryName) {
+  if (Style* existing = GetSubstyle(key, false))
+    return existing;
+  const Style empty(nullptr, categoryName);
+  SetProperty(key, ZelUtils::Any(static_cast<const Style*>(&empty)));
+  return GetSubstyle(key, false);
+}
+
+const ZelUtils::Any& Style::GetPathProperty(const std::vector<PropertyKey>& path) const {
+  if (path.empty())
+    throw std::exception();
+  const PropertyKey& last = path.back();
+  const Style* style = this;
+  for (std::size_t i = 0; i + 1 < path.size(); ++i) {
+    const Style* next = style->GetSubstyle(path[i], false);
+    if (!next) {
+      // The path leaves the own substyles: walk the element categories from
+      // this style's own category, whatever depth the walk failed at.
+      const StyleCategory* category = m_category.get();
+      const StyleManager& manager = GetStyleManager();
+      for (std::size_t j = i; j + 1 < path.size(); ++j) {
+        if (!category)
+          throw std::exception();
+        if (const BaseStyleProperty* behaviour = category->GetStyleProperty(path[j])) {
+          const std::shared_ptr<StyleCategory>* element =
+              manager.FindCategory(behaviour->GetElementCategoryName());
+          category = element ? element->get() : nullptr;
+        }
+      }
+      if (!category)
+        throw std::exception();
+      return category->GetDefaultValue(last);
+    }
+    style = next;
+  }
+  return style->GetProperty(last);
+}
+
+// ---------------------------------------------------------------------------
+// Editing
+
+void Style::SetProperty(const PropertyKey& key, const ZelUtils::Any& value) {
+  ZelUtils::Any* old = m_properties.Find(key);
+  if (old == &value)
+    return;  // already this style's own value
+  // Copied before the old value goes, in case `value` lives inside it.
+  ZelUtils::Any copy(value);
+  BaseStyleProperty* behaviour = FindBehaviour(key);
+  if (old) {
+    if (behaviour)
+      behaviour->DestroyPropertyData(*old);
+    m_properties.Erase(key);
+  }
+  if (!behaviour)
+    return;
+  ZelUtils::Any result = behaviour->MovePropertyData(this, std::move(copy));
+  if (!result.IsEmpty())
+    m_properties.Insert(key, std::move(result));
+}
+
+void Style::SetProperty(const PropertyKey& key, ZelUtils::Any&& value) {
+  BaseStyleProperty* behaviour = FindBehaviour(key);
+  if (!behaviour)
+    return;
+  ZelUtils::Any result = behaviour->MovePropertyData(this, std::move(value));
+  if (result.IsEmpty()) {
+    // Deliberately without DestroyPropertyData on the old value.
+    m_properties.Erase(key);
+    return;
+  }
+  if (ZelUtils::Any* old = m_properties.Find(key)) {
+    behaviour->DestroyPropertyData(*old);
+    if ((old = m_properties.Find(key)) != nullptr) {
+      *old = std::move(result);
+      return;
+    }
+  }
+  m_properties.Insert(key, std::move(result));
+}
+
+void Style::DestroyPropertyData(const PropertyKey& key, const ZelUtils::Any& value) const {
+  if (const BaseStyleProperty* behaviour = FindBehaviour(key))
+    behaviour->DestroyPropertyData(value);
+}
+
+bool Style::ClearProperty(const PropertyKey& key) {
+  ZelUtils::Any* old = m_properties.Find(key);
+  if (!old)
+    return false;
+  if (const BaseStyleProperty* behaviour = FindBehaviour(key))
+    behaviour->DestroyPropertyData(*old);
+  m_properties.Erase(key);
+  return true;
+}
+
+bool Style::ClearPathProperty(const std::vector<PropertyKey>& path) {
+  if (path.empty())
+    return false;
+  Style* style = this;
+  for (std::size_t i = 0; i + 1 < path.size(); ++i)
+    if (!(style = style->GetSubstyle(path[i], false)))
+      return false;
+  return style->ClearProperty(path.back());
+}
+
+bool Style::RevertPathProperty(const std::vector<PropertyKey>& path, bool force) {
+  bool canInherit = force || m_parent || (m_owner && m_owner->m_parent);
+  if (path.empty())
+    return false;
+  Style* style = this;
+  for (std::size_t i = 0; i + 1 < path.size(); ++i) {
+    if (!(style = style->GetSubstyle(path[i], false)))
+      return false;
+    canInherit = canInherit || style->m_parent;
+  }
+  return canInherit && style->ClearProperty(path.back());
+}
+
+void Style::ClearProperties(const Style* keysOf) {
+  if (!keysOf)
+    return;
+  for (const PropertyKey& key : OwnKeys(keysOf->m_properties))
+    ClearProperty(key);
+}
+
+void Style::ClearAllProperties() { DestroyOwnValues(); }
+
+Style* Style::CopyProperties(const std::set<PropertyKey>& keys) const {
+  std::unique_ptr<Style> copy(new Style(nullptr, GetCategoryName()));
+  for (const PropertyKey& key : keys) {
+    if (!FindBehaviour(key))
+      continue;  // SetProperty would drop it; its lookup could only throw
+    copy->SetProperty(key, GetProperty(key));
+  }
+  return copy.release();
+}
+
+void Style::SetPathProperty(const std::vector<PropertyKey>& path, const ZelUtils::Any& value) {
+  if (path.empty())
+    return;
+  Style* style = this;
+  for (std::size_t i = 0; i + 1 < path.size(); ++i)
+    if (!(style = GetOrCreateSubstyle(*style, path[i])))
+      return;
+  style->SetProperty(path.back(), value);
+}
+
+void Style::SetPathProperty(const std::vector<PropertyKey>& path, ZelUtils::Any&& value) {
+  if (path.empty())
+    return;
+  Style* style = this;
+  for (std::size_t i = 0; i + 1 < path.size(); ++i)
+    if (!(style = GetOrCreateSubstyle(*style, path[i])))
+      return;
+  style->SetProperty(path.back(), std::move(value));
+}
+
+void Style::SetPathProperty(const std::vector<PropertyKey>& path, const Style* source) {
+  if (path.empty())
+    return;
+  Style* destination = this;
+  for (std::size_t i = 0; i + 1 < path.size(); ++i) {
+    if (!(destination = GetOrCreateSubstyle(*destination, path[i])))
+      return;
+    if (!(source = source->GetSubstyle(path[i], false))) {
+      destination->ClearProperty(path[i + 1]);
+      return;
+    }
+  }
+  if (const ZelUtils::Any* own = source->m_properties.Find(path.back()))
+    destination->SetProperty(path.back(), *own);
+  else
+    destination->ClearProperty(path.back());
+}
+
+void Style::SetProperties(const std::vector<std::vector<PropertyKey>>& paths,
+                          const Style* source) {
+  for (const std::vector<PropertyKey>& path : paths)
+    SetPathProperty(path, source);
+}
+
+// ---------------------------------------------------------------------------
+// Merging, flattening and owner-free clones
+
+void Style::MergeProperties(const Style* other, bool overwrite) {
+  // Keys first: merging into this style may reshape `other` when it is this.
+  for (const PropertyKey& key : OwnKeys(other->m_properties))
+    if (const BaseStyleProperty* behaviour = other->FindBehaviour(key))
+      behaviour->MergeProperty(this, other, key, overwrite);
+}
+
+void Style::MergeParentProperties(const Style* parent) {
+  for (const PropertyKey& key : OwnKeys(parent->m_properties))
+    if (const BaseStyleProperty* behaviour = parent->FindBehaviour(key))
+      behaviour->MergeParentProperty(this, parent, key);
+}
+
+bool Style::Flatten(std::set<PropertyKey>& flattenedKeys) {
+  if (m_category) {
+    const std::shared_ptr<const StyleCategory> category = m_category;
+    for (const PropertyKey& key : category->GetPropertyOrder()) {
+      const BaseStyleProperty* behaviour = category->GetStyleProperty(key);
+      if (behaviour && behaviour->FlattenProperty(this, key))
+        flattenedKeys.insert(key);
+    }
+  }
+  m_parent = nullptr;
+  return !flattenedKeys.empty();
+}
+
+bool Style::Flatten() {
+  std::set<PropertyKey> flattenedKeys;
+  return Flatten(flattenedKeys);
+}
+
+Style* Style::CreateFlattenedStyle(std::set<PropertyKey>& flattenedKeys) const {
+  std::unique_ptr<Style> copy(new Style(*this));
+  // Borrow this style's place so that owner-based inheritance resolves alike.
+  copy->m_owner = m_owner;
+  copy->m_ownerPropertyKey = m_ownerPropertyKey;
+  copy->Flatten(flattenedKeys);
+  copy->m_owner = nullptr;
+  return copy.release();
+}
+
+Style* Style::CreateFlattenedStyle() const {
+  std::set<PropertyKey> flattenedKeys;
+  return CreateFlattenedStyle(flattenedKeys);
+}
+
+bool Style::StylePropertiesHasDependencyOnOwner() const {
+  if (m_parent)
+    return false;
+  for (const Style* owner = m_owner; owner; owner = owner->m_owner)
+    if (owner->m_parent)
+      return true;
+  return false;
+}
+
+Style* Style::CreateStyleCloneWithNoDependencyOnOwner() const {
+  if (m_parent || !StylePropertiesHasDependencyOnOwner())
+    return new Style(*this);
+  std::vector<PropertyKey> keys;
+  std::vector<Style*> ownerParents;
+  const Style* top = this;
+  while (top->m_owner) {
+    keys.push_back(top->m_ownerPropertyKey);
+    top = top->m_owner;
+    if (top->m_parent)
+      ownerParents.push_back(top->m_parent);
+  }
+  // Bake what the topmost owner's copy inherits from those parents into it,
+  // then take the substyle at this style's place.
+  const std::unique_ptr<Style> root(new Style(*top));
+  const bool sorted = std::is_sorted(ownerParents.begin(), ownerParents.end(), std::less<>());
+  root->RemoveDependency(StyleSpan(ownerParents, sorted), true);
+  const Style* reached = root.get();
+  for (std::size_t i = keys.size(); i-- > 0 && reached;)
+    reached = reached->GetSubstyle(keys[i], false);
+  return new Style(reached ? *reached : *this);
+}
+
+Style* Style::CreateSubStyleCloneWithNoDependencyOnOwner(const PropertyKey& key) const {
+  if (const Style* substyle = GetSubstyle(key, false))
+    return substyle->CreateStyleCloneWithNoDependencyOnOwner();
+  ZelUtils::Any found;
+  if (GetProperty(key, found))
+    if (Style* const* substyle = found.GetIf<Style*>(); substyle && *substyle)
+      return (*substyle)->CreateStyleCloneWithNoDependencyOnOwner();
+  const BaseStyleProperty* behaviour = FindBehaviour(key);
+  return new Style(nullptr, behaviour ? behaviour->GetElementCategoryName() : PropertyKey::Empty);
+}
+
+void Style::CopySubstyleProperties(const Style* source, const PropertyKey& key) {
+  const Style* sourceSubstyle = source->GetSubstyle(key, false);
+  ZelUtils::Any scratch;
+  if (!source->GetProperty(key, scratch)) {
+    // The source resolves to the default: so must this style.
+    ClearProperty(key);
+    const ZelUtils::Any& defaultValue = DefaultValue(key);
+    if (!defaultValue.IsTypeCompatible<Style*>())
+      throw std::bad_cast();
+    const Style* defaultSubstyle = defaultValue.Get<Style*>();
+    if (GetSubstyle(key, true) != defaultSubstyle)
+      SetProperty(key, ZelUtils::Any(defaultSubstyle));
+    return;
+  }
+  if (sourceSubstyle &&
+      (sourceSubstyle->m_parent || !sourceSubstyle->StylePropertiesHasDependencyOnOwner())) {
+    SetProperty(key, ZelUtils::Any(sourceSubstyle));
+    return;
+  }
+  // Does this style inherit from the same place as the source?
+  bool sameInheritance = true;
+  const Style* inheritedFrom = nullptr;
+  const Style* counterpart = nullptr;
+  if (source->m_parent) {
+    inheritedFrom = source->m_parent;
+    counterpart = this;
+  } else {
+    const Style* sourceOwner = source;
+    const Style* ownOwner = this;
+    do {
+      sourceOwner = sourceOwner->m_owner;
+      ownOwner = ownOwner ? ownOwner->m_owner : nullptr;
+    } while (sourceOwner && !sourceOwner->m_parent);
+    if (sourceOwner) {
+      inheritedFrom = sourceOwner->m_parent;
+      counterpart = ownOwner;
+    }
+  }
+  if (inheritedFrom)
+    sameInheritance = counterpart && counterpart->m_parent == inheritedFrom;
+  if (!sameInheritance) {
+    const std::unique_ptr<Style> clone(source->CreateSubStyleCloneWithNoDependencyOnOwner(key));
+    SetProperty(key, ZelUtils::Any(static_cast<const Style*>(clone.get())));
+    return;
+  }
+  if (sourceSubstyle)
+    SetProperty(key, ZelUtils::Any(sourceSubstyle));
+  else
+    ClearProperty(key);
+}
+
+// ---------------------------------------------------------------------------
+// Dependencies
+
+bool Style::HasDependency(StyleSpan styles, bool parentOnly) const {
+  if (styles.contains(this))
+    return true;
+  if (m_parent) {
+    if (styles.contains(m_parent))
+      return true;
+    if (!parentOnly && m_parent->HasDependency(styles, false))
+      return true;
+  }
+  for (const PropertyMap::Entry& entry : m_properties)
+    if (const BaseStyleProperty* behaviour = FindBehaviour(entry.first))
+      if (behaviour->HasDependency(entry.second, styles, parentOnly))
+        return true;
+  return false;
+}
+
+std::vector<Style*> Style::GetDependencies(StyleSpan styles, bool parentOnly) const {
+  if (styles.is_sorted())
+    return GetDependenciesImpl(styles, parentOnly);
+  std::vector<Style*> sorted(styles.begin(), styles.end());
+  std::sort(sorted.begin(), sorted.end(), std::less<>());
+  return GetDependenciesImpl(StyleSpan(sorted, true), parentOnly);
+}
+
+std::vector<Style*> Style::GetDependenciesImpl(StyleSpan styles, bool parentOnly) const {
+  std::vector<Style*> result;
+  if (styles.contains(this))
+    result.push_back(const_cast<Style*>(this));
+  if (m_parent && styles.contains(m_parent))
+    result.push_back(m_parent);
+  if (!styles.empty()) {
+    if (!parentOnly && m_parent) {
+      const std::vector<Style*> inherited = m_parent->GetDependencies(styles, false);
+      result.insert(result.end(), inherited.begin(), inherited.end());
+    }
+    for (const PropertyMap::Entry& entry : m_properties) {
+      if (const BaseStyleProperty* behaviour = FindBehaviour(entry.first)) {
+        const std::vector<Style*> held = behaviour->GetDependencies(entry.second, styles, parentOnly);
+        result.insert(result.end(), held.begin(), held.end());
+      }
+    }
+  }
+  std::sort(result.begin(), result.end(), std::less<>());
+  result.erase(std::unique(result.begin(), result.end()), result.end());
+  return result;
+}
+
+bool Style::HasParentalDependency(StyleSpan styles) const {
+  for (const Style* ancestor = m_parent; ancestor; ancestor = ancestor->m_parent)
+    if (styles.contains(ancestor) || ancestor->HasDependency(styles, false))
+      return true;
+  return false;
+}
+
+bool Style::HasParentalDependency() const {
+  if (m_parent || (m_owner && m_owner->m_parent))
+    return true;
+  for (const PropertyMap::Entry& entry : m_properties)
+    if (const BaseStyleProperty* behaviour = FindBehaviour(entry.first))
+      if (behaviour->HasParentalDependency(entry.second))
+        return true;
+  return false;
+}
+
+void Style::MergeParent() {
+  Style* parent = m_parent;
+  MergeParentProperties(parent);
+  m_parent = parent->m_parent;
+}
+
+void Style::RemoveDependency(StyleSpan styles, bool parentOnly) {
+  if (m_parent && parentOnly) {
+    // Only the run of removed styles right above this one.
+    while (m_parent && styles.contains(m_parent))
+      MergeParent();
+  } else if (m_parent) {
+    for (Style* removed : styles) {
+      if (!m_parent)
+        break;
+      bool isAncestor = false;
+      for (const Style* ancestor = m_parent; ancestor && !isAncestor; ancestor = ancestor->m_parent)
+        isAncestor = ancestor == removed;
+      if (isAncestor) {
+        const Style* stop = removed->m_parent;
+        while (m_parent && m_parent != stop)
+          MergeParent();
+      }
+    }
+  }
+  for (std::size_t i = 0; i < m_properties.size(); ++i)
+    if (const BaseStyleProperty* behaviour = FindBehaviour(m_properties[i].first))
+      behaviour->RemoveDependency(m_properties[i].second, styles, parentOnly);
+}
+
+void Style::RemoveAllDependencies() {
+  while (m_parent)
+    MergeParent();
+  for (std::size_t i = 0; i < m_properties.size(); ++i)
+    if (const BaseStyleProperty* behaviour = FindBehaviour(m_properties[i].first))
+      behaviour->RemoveAllDependencies(m_properties[i].second);
+}
+
+void Style::RemapDependency(const std::map<Style*, Style*>& map) {
+  if (m_parent) {
+    const auto found = map.find(m_parent);
+    if (found != map.end() && found->second)
+      m_parent = found->second;
+  }
+  for (std::size_t i = 0; i < m_properties.size(); ++i)
+    if (const BaseStyleProperty* behaviour = FindBehaviour(m_properties[i].first))
+      behaviour->RemapDependency(m_properties[i].second, map);
+}
+
+void Style::RemapPointer(const std::vector<std::pair<ZelUtils::Any, ZelUtils::Any>>& pairs) {
+  for (std::size_t i = 0; i < m_properties.size(); ++i) {
+    if (m_properties[i].second.IsEmpty())
+      continue;
+    if (const BaseStyleProperty* behaviour = FindBehaviour(m_properties[i].first))
+      behaviour->RemapPointer(m_properties[i].second, pairs);
+  }
+}
+
+bool Style::ProcessProperties(const PropertyVisitor& visit) {
+  // By index: a visitor may edit this style's values.
+  for (std::size_t i = 0; i < m_properties.size(); ++i) {
+    const PropertyKey key = m_properties[i].first;
+    if (const BaseStyleProperty* behaviour = FindBehaviour(key))
+      if (!behaviour->ProcessProperty(m_properties[i].second, visit, this, key))
+        return false;
+  }
+  return true;
+}
+
+bool Style::ProcessProperties(const std::vector<std::vector<PropertyKey>>& paths,
+                              const PropertyVisitor& visit) {
+  for (const std::vector<PropertyKey>& path : paths) {
+    if (path.empty())
+      continue;
+    Style* style = this;
+    for (std::size_t i = 0; i + 1 < path.size() && style; ++i)
+      style = style->GetSubstyle(path[i], false);
+    if (!style)
+      continue;
+    const BaseStyleProperty* behaviour = style->FindBehaviour(path.back());
+    ZelUtils::Any* own = style->m_properties.Find(path.back());
+    if (behaviour && own && !behaviour->ProcessProperty(*own, visit, style, path.back()))
+      return false;
+  }
+  return true;
+}
+
+// ---------------------------------------------------------------------------
+// JSON
+
+void Style::Serialize(const StyleSheet& sheet, JsonValue& out, bool includeTemporary) const {
+  Json::Object& object = out.Emplace<Json::Object>();
+  object.Reserve(m_properties.size() + 3);
+  ZelStringT<char16_t> parentName = sheet.GetStyleName(m_parent);
+  if (!parentName.IsEmpty())
+    object.AddValue(k_strPropertyInherits, Json::Value(std::move(parentName)));
+  if (!m_externalID.IsEmpty())
+    object.AddValue(k_strExternalID, Json::Value(m_externalID));
+  if (!m_externalName.IsEmpty())
+    object.AddValue(k_strExternalName, Json::Value(m_externalName));
+  const StyleManager& manager = GetStyleManager();
+  const PropertyKey categoryKey = GetCategoryName();
+  for (const PropertyMap::Entry& entry : m_properties) {
+    const BaseStyleProperty* behaviour = manager.GetStyleProperty(categoryKey, entry.first);
+    if (!behaviour || (!includeTemporary && behaviour->IsTemporary()))
+      continue;
+    Json::Value json;
+    if (behaviour->Serialize(sheet, this, entry.second, json))
+      object.AddValue(entry.first.GetString(), std::move(json));
+  }
+}
+
+ZelStringT<char16_t> Style::Serialize(const StyleSheet& sheet, bool format,
+                                      bool includeTemporary) const {
+  Json::Value value;
+  Serialize(sheet, value, includeTemporary);
+  return Json::ValueToString(value, format);
+}
+
+bool Style::IsAncestorOrSelf(const Style* style) const noexcept {
+  for (const Style* ancestor = style; ancestor; ancestor = ancestor->m_parent)
+    if (ancestor == this)
+      return true;
+  return false;
+}
+
+void Style::DeserializeJson(const StyleSheet& sheet, const Json::Object& object) {
+  StyleManager& manager = GetStyleManager();
+  const PropertyKey categoryKey = GetCategoryName();
+  std::vector<std::pair<const BaseStyleProperty*, const Json::Value*>> deprecated;
+  std::vector<const BaseStyleProperty*> needAdjustment;
+  for (std::size_t i = 0; i < object.GetSize(); ++i) {
+    const ZelStringT<char16_t>& name = object.GetValueName(i);
+    const Json::Value& value = object.GetValue(i);
+    if (name == k_strPropertyInherits) {
+      const ZelStringT<char16_t>* parentName = value.GetIf<ZelStringT<char16_t>>();
+      if (!parentName || parentName->IsEmpty())
+        continue;
+      const WImportStyleInfo& info = manager.GetImportStyleInfo();
+      if (info.names.count(*parentName))
+        continue;
+      const auto renamed = info.renames.find(*parentName);
+      Style* parent = sheet.GetStyle(renamed != info.renames.end() ? renamed->second : *parentName);
+      // Never this style itself, nor a style that already inherits from it:
+      // a parent cycle would make every lookup endless.
+      if (parent && !IsAncestorOrSelf(parent))
+        m_parent = parent;
+    } else if (name == k_strExternalID) {
+      const ZelStringT<char16_t>* id = value.GetIf<ZelStringT<char16_t>>();
+      if (id && !id->IsEmpty())
+        SetExternalID(*id);
+    } else if (name == k_strExternalName) {
+      const ZelStringT<char16_t>* externalName = value.GetIf<ZelStringT<char16_t>>();
+      if (externalName && !externalName->IsEmpty())
+        SetExternalName(*externalName);
+    } else {
+      const BaseStyleProperty* behaviour = manager.GetStyleProperty(categoryKey, PropertyKey(name));
+      if (!behaviour)
+        continue;
+      if (behaviour->IsDeprecated()) {
+        deprecated.emplace_back(behaviour, &value);
+        continue;
+      }
+      behaviour->Deserialize(sheet, this, value);
+      if (behaviour->NeedAdjustementsForStyleIO())
+        needAdjustment.push_back(behaviour);
+    }
+  }
+  // Deprecated properties are read after all current ones, deliberately.
+  for (const auto& [behaviour, value] : deprecated)
+    behaviour->Deserialize(sheet, this, *value);
+  for (const BaseStyleProperty* behaviour : needAdjustment)
+    behaviour->AdjustAfterDeserialize(sheet, this);
+}
+
+Style* Style::Deserialize(const StyleSheet& sheet, const Json::Object& object,
+                          const PropertyKey& category) {
+  std::unique_ptr<Style> style(new Style(nullptr, category));
+  style->DeserializeJson(sheet, object);
+  return style.release();
+}
+
+} // namespace Styles
+
+namespace ZelUtils {
+template <>
+const PooledString<Styles::StringPool> PooledString<Styles::StringPool>::Empty(u"");
+} // namespace ZelUtils

@@ -1,0 +1,323 @@
+// The style object and the keys that name its properties. A PropertyKey is
+// an interned UTF-16 name, one word wide, compared by identity; the process
+// pool that holds the names is Styles::StringPool::Get().
+#pragma once
+
+#include <Styles/Export.h>
+
+#include <ZelPlatform/ZelString.h>
+#include <ZelUtils/Any.h>
+#include <ZelUtils/Delegate.h>
+#include <ZelUtils/Span.h>
+#include <ZelUtils/StringPool.h>
+
+#include <cstddef>
+#include <functional>
+#include <map>
+#include <memory>
+#include <set>
+#include <utility>
+#include <vector>
+
+namespace Json {
+class Value;
+class Object;
+} // namespace Json
+
+namespace Styles {
+
+// Tag of the process-wide pool of property and category names.
+struct STYLES_API StringPool {
+  // The pool, created on first use (thread-safe) and destroyed at exit.
+  static ZelUtils::StringPool& Get();
+};
+
+// An interned name. Equality, ordering and hashing go by pool entry, so maps
+// of keys iterate in identity order, not alphabetically.
+using PropertyKey = ZelUtils::PooledString<StringPool>;
+
+class Style;
+class StyleCategory;
+class StyleSheet;
+class BaseStyleProperty;
+
+// The JSON value written and read by styles and behaviours.
+using JsonValue = Json::Value;
+// A read-only set of styles that knows whether it is sorted by address.
+using StyleSpan = ZelUtils::maybe_sorted_span<Style* const, std::less<void>>;
+// Visitor of property values: (value, holding style, key); false stops.
+using PropertyVisitor =
+    ZelUtils::PortableVersion::Delegate<bool(ZelUtils::Any&, Style*, const PropertyKey&)>;
+// Visitor of styles; false stops.
+using StyleVisitor = ZelUtils::PortableVersion::Delegate<bool(Style*)>;
+
+// The own values of a style: a flat array sorted by key identity, searched
+// linearly while small and by bisection when large. Iteration is in key order.
+class STYLES_API PropertyMap {
+public:
+  using Entry = std::pair<PropertyKey, ZelUtils::Any>;
+  using const_iterator = std::vector<Entry>::const_iterator;
+  using iterator = std::vector<Entry>::iterator;
+
+  const_iterator begin() const noexcept { return m_entries.begin(); }
+  const_iterator end() const noexcept { return m_entries.end(); }
+  iterator begin() noexcept { return m_entries.begin(); }
+  iterator end() noexcept { return m_entries.end(); }
+  std::size_t size() const noexcept { return m_entries.size(); }
+  bool empty() const noexcept { return m_entries.empty(); }
+  const Entry& operator[](std::size_t i) const noexcept { return m_entries[i]; }
+  Entry& operator[](std::size_t i) noexcept { return m_entries[i]; }
+
+  // The value stored under `key`, or null.
+  const ZelUtils::Any* Find(const PropertyKey& key) const noexcept {
+    const std::size_t i = LowerBound(key);
+    return i < m_entries.size() && m_entries[i].first == key ? &m_entries[i].second : nullptr;
+  }
+  ZelUtils::Any* Find(const PropertyKey& key) noexcept {
+    return const_cast<ZelUtils::Any*>(static_cast<const PropertyMap*>(this)->Find(key));
+  }
+  bool Contains(const PropertyKey& key) const noexcept { return Find(key) != nullptr; }
+  // Stores `value` under `key` unless the key is present; true when stored.
+  bool Insert(const PropertyKey& key, ZelUtils::Any&& value);
+  // Removes the entry of `key`; true when there was one.
+  bool Erase(const PropertyKey& key);
+  void Clear() noexcept { m_entries.clear(); }
+  void Swap(PropertyMap& other) noexcept { m_entries.swap(other.m_entries); }
+
+private:
+  // Index of the first entry whose key is not less than `key`.
+  std::size_t LowerBound(const PropertyKey& key) const noexcept {
+    constexpr std::size_t kLinearLimit = 16;
+    const std::size_t count = m_entries.size();
+    if (count <= kLinearLimit) {
+      std::size_t i = 0;
+      while (i < count && m_entries[i].first < key)
+        ++i;
+      return i;
+    }
+    std::size_t first = 0, length = count;
+    while (length > 0) {
+      const std::size_t half = length / 2;
+      if (m_entries[first + half].first < key) {
+        first += half + 1;
+        length -= half + 1;
+      } else {
+        length = half;
+      }
+    }
+    return first;
+  }
+
+  std::vector<Entry> m_entries;
+};
+
+// A set of property values of one category, with a parent to inherit from
+// and, for a substyle, the style (owner) whose property holds it. Every
+// value-specific decision goes through the behaviour that the category
+// registers for the key. The style owns its values and the substyles in them;
+// parent and owner are never owned.
+class STYLES_API Style {
+public:
+  Style();
+  // A free style of the category registered under `categoryName` (none when
+  // unknown) inheriting from `parent` (not owned).
+  Style(Style* parent, const PropertyKey& categoryName);
+  // A copy has the source's parent, category, strings and copied values but
+  // no owner.
+  Style(const Style& other);
+  Style(Style&& other);
+  Style& operator=(const Style& other);
+  // Takes the source's values; the source keeps its parent, category and
+  // strings but no values.
+  Style& operator=(Style&& other);
+  // Destroys the own values (and so the owned substyles).
+  ~Style();
+
+  void SetParent(Style* parent) noexcept { m_parent = parent; }
+  Style* GetParent() const noexcept { return m_parent; }
+  Style* GetOwner() const noexcept { return m_owner; }
+  const PropertyKey& GetOwnerPropertyKey() const noexcept { return m_ownerPropertyKey; }
+  // Used by substyle behaviours to point a held substyle back at its holder.
+  void SetOwner(Style* owner, const PropertyKey& ownerPropertyKey) noexcept {
+    m_owner = owner;
+    m_ownerPropertyKey = ownerPropertyKey;
+  }
+  // Binds the style to the registered category `name`; on any failure the
+  // previous category stays. Never throws.
+  void SetCategory(const PropertyKey& name);
+  PropertyKey GetCategoryName() const noexcept;
+  const std::shared_ptr<const StyleCategory>& GetCategory() const noexcept { return m_category; }
+  // Also sets the same field of the single substyles held directly by a
+  // style of the "style" category (one level deep).
+  void SetExternalID(const ZelStringT<char16_t>& id);
+  void SetExternalName(const ZelStringT<char16_t>& name);
+  const ZelStringT<char16_t>& GetExternalID() const noexcept { return m_externalID; }
+  const ZelStringT<char16_t>& GetExternalName() const noexcept { return m_externalName; }
+  bool IsExternal() const noexcept { return !m_externalID.IsEmpty(); }
+  // The own values in key order.
+  const PropertyMap& GetProperties() const noexcept { return m_properties; }
+
+  // Points the substyles of every own value back at this style.
+  void RepairSubstyleOwnerPointers();
+  // Exchanges everything but owner and owner key, then repairs both styles.
+  void SwapData(Style& other);
+
+  // Same category object, parent, strings and values; owners are ignored and
+  // a key without behaviour makes the styles unequal.
+  bool operator==(const Style& other) const;
+  bool operator!=(const Style& other) const { return !(*this == other); }
+  // A strict order for sorting; a key without behaviour counts as equal.
+  bool operator<(const Style& other) const;
+  // Like operator<, but equal parentless substyles are ordered by the
+  // substyle their owners would inherit from.
+  bool substyle_less_including_owner_based_inheritance(const Style& other) const;
+
+  // Lookup. References point into styles or categories and are never copies.
+  // The own value, else the inherited one, else the category default. Throws
+  // std::exception for a key nobody holds that the category does not register.
+  const ZelUtils::Any& GetProperty(const PropertyKey& key) const;
+  // The value the style would have without its own value.
+  const ZelUtils::Any& GetInheritedProperty(const PropertyKey& key) const;
+  // False for an unregistered key or when only the default is found; else
+  // copies the value into `out`.
+  bool GetProperty(const PropertyKey& key, ZelUtils::Any& out) const;
+  // False when only the default is found; else copies into `out`.
+  bool GetInheritedProperty(const PropertyKey& key, ZelUtils::Any& out) const;
+  // Copies the own value into `out`; false when there is none.
+  bool GetOverrideProperty(const PropertyKey& key, ZelUtils::Any& out) const;
+  bool DoesOverrideProperty(const PropertyKey& key) const noexcept;
+  // The single substyle under `key`. With `inherited` the effective value
+  // counts and must hold a Style* (else std::bad_cast); without, only an own
+  // Style* value counts (else null). Owned by the holding style.
+  Style* GetSubstyle(const PropertyKey& key, bool inherited) const;
+  // The own substyle under `key`, created from an empty style of
+  // `categoryName` when missing; null when nothing can be stored.
+  Style* GetSubstyleAndCreateIfMissing(const PropertyKey& key, const PropertyKey& categoryName);
+  // The effective value at the end of `path`; where the path leaves the own
+  // substyles, the default of the category reached through element
+  // categories. Throws std::exception for an empty path or a lost category.
+  const ZelUtils::Any& GetPathProperty(const std::vector<PropertyKey>& path) const;
+
+  // Editing. A key without behaviour in the category is never stored.
+  // Copying form: destroys the old value, then stores what the behaviour
+  // makes of a copy of `value` (an empty result clears the key).
+  void SetProperty(const PropertyKey& key, const ZelUtils::Any& value);
+  // Moving form: does nothing without category or behaviour; an empty result
+  // removes the entry without destroying the old value.
+  void SetProperty(const PropertyKey& key, ZelUtils::Any&& value);
+  // Wraps `value` in an Any and calls the moving form.
+  template <class T, class = std::enable_if_t<!std::is_same<std::decay_t<T>, ZelUtils::Any>::value>>
+  void SetProperty(const PropertyKey& key, T value) {
+    SetProperty(key, ZelUtils::Any(std::move(value)));
+  }
+  // Releases what `value` owns through the behaviour of `key`, if any.
+  void DestroyPropertyData(const PropertyKey& key, const ZelUtils::Any& value) const;
+  // Removes the own value of `key`; false when there was none.
+  bool ClearProperty(const PropertyKey& key);
+  // ClearProperty at the end of `path` through own substyles.
+  bool ClearPathProperty(const std::vector<PropertyKey>& path);
+  // Clears only where clearing lets a value be inherited (or when `force`).
+  bool RevertPathProperty(const std::vector<PropertyKey>& path, bool force);
+  // Clears every key that `keysOf` holds itself; nothing for null.
+  void ClearProperties(const Style* keysOf);
+  // Destroys and removes every own value; links, category and strings stay.
+  void ClearAllProperties();
+  // A new free style of the same category holding the effective values of
+  // `keys` (defaults included) as its own. The caller owns it.
+  Style* CopyProperties(const std::set<PropertyKey>& keys) const;
+  // Sets the last key of `path`, creating own substyles along the way.
+  void SetPathProperty(const std::vector<PropertyKey>& path, const ZelUtils::Any& value);
+  void SetPathProperty(const std::vector<PropertyKey>& path, ZelUtils::Any&& value);
+  // Copies the own value at `path` of `source` (not null), clearing where
+  // the source holds none.
+  void SetPathProperty(const std::vector<PropertyKey>& path, const Style* source);
+  void SetProperties(const std::vector<std::vector<PropertyKey>>& paths, const Style* source);
+
+  // Merging and flattening.
+  // Merges every own value of `other` through the behaviours of `other`'s
+  // category; with `overwrite` false values this style sets itself stay.
+  void MergeProperties(const Style* other, bool overwrite);
+  // Takes over the values `parent` sets itself where this style sets none.
+  void MergeParentProperties(const Style* parent);
+  // Makes every effective value of the category's keys the style's own and
+  // cuts the parent link. Keys flattened are added to `flattenedKeys`; the
+  // result is whether that set is non-empty (it is not cleared on entry).
+  bool Flatten(std::set<PropertyKey>& flattenedKeys);
+  bool Flatten();
+  // A flattened free copy, resolved as this style resolves in its owner.
+  // The caller owns it.
+  Style* CreateFlattenedStyle(std::set<PropertyKey>& flattenedKeys) const;
+  Style* CreateFlattenedStyle() const;
+  // True when some values can only be resolved through the owners.
+  bool StylePropertiesHasDependencyOnOwner() const;
+  // Makes this style's substyle under `key` resolve as `source`'s does.
+  void CopySubstyleProperties(const Style* source, const PropertyKey& key);
+  // Free copies that resolve on their own as the originals do inside their
+  // owners. The caller owns the result.
+  Style* CreateSubStyleCloneWithNoDependencyOnOwner(const PropertyKey& key) const;
+  Style* CreateStyleCloneWithNoDependencyOnOwner() const;
+
+  // Dependencies on other styles: itself, its parents and what values hold.
+  bool HasDependency(StyleSpan styles, bool parentOnly) const;
+  // The styles of `styles` this style depends on, sorted, without repeats.
+  std::vector<Style*> GetDependencies(StyleSpan styles, bool parentOnly) const;
+  // The same for a span that is sorted.
+  std::vector<Style*> GetDependenciesImpl(StyleSpan styles, bool parentOnly) const;
+  // Whether an ancestor is in `styles` or depends on one of them.
+  bool HasParentalDependency(StyleSpan styles) const;
+  // Whether the style inherits from any other style.
+  bool HasParentalDependency() const;
+  // Cuts the dependencies on `styles`, keeping every effective value.
+  void RemoveDependency(StyleSpan styles, bool parentOnly);
+  // Folds the whole parent chain into the style and cuts every dependency.
+  void RemoveAllDependencies();
+  // Redirects the parent and the values from old styles to new ones; a
+  // mapping to null is ignored.
+  void RemapDependency(const std::map<Style*, Style*>& map);
+  // Redirects pointer-like values held in the values; the parent stays.
+  void RemapPointer(const std::vector<std::pair<ZelUtils::Any, ZelUtils::Any>>& pairs);
+  // Visits every own value in key order; false when the visitor stopped.
+  bool ProcessProperties(const PropertyVisitor& visit);
+  // Visits the own values at `paths`; false when the visitor stopped.
+  bool ProcessProperties(const std::vector<std::vector<PropertyKey>>& paths,
+                         const PropertyVisitor& visit);
+
+  // JSON form. Fills `out` with the style's object: "inherits" (the parent's
+  // name in `sheet`), "id", "original", then the own values in key order.
+  void Serialize(const StyleSheet& sheet, JsonValue& out, bool includeTemporary) const;
+  // The same as text.
+  ZelStringT<char16_t> Serialize(const StyleSheet& sheet, bool format, bool includeTemporary) const;
+  // Reads `object` into this style (which has its category); parent names
+  // resolve in `sheet`. Exceptions of behaviours pass through.
+  void DeserializeJson(const StyleSheet& sheet, const Json::Object& object);
+  // A new parentless style of `category` read from `object`; the caller owns it.
+  static Style* Deserialize(const StyleSheet& sheet, const Json::Object& object,
+                            const PropertyKey& category);
+
+private:
+  // The behaviour of `key` in this style's category, or null.
+  BaseStyleProperty* FindBehaviour(const PropertyKey& key) const;
+  void DestroyOwnValues();
+  // Takes over the parent's own values, then inherits from its parent.
+  void MergeParent();
+  // Whether this style is `style` or one of its ancestors.
+  bool IsAncestorOrSelf(const Style* style) const noexcept;
+  const ZelUtils::Any& DefaultValue(const PropertyKey& key) const;
+  const ZelUtils::Any* FindOwnerBasedParentValue(const Style*& cur, const PropertyKey& key) const;
+
+  PropertyMap m_properties;
+  Style* m_parent = nullptr;
+  Style* m_owner = nullptr;
+  PropertyKey m_ownerPropertyKey;
+  std::shared_ptr<const StyleCategory> m_category;
+  ZelStringT<char16_t> m_externalID;
+  ZelStringT<char16_t> m_externalName;
+};
+
+} // namespace Styles
+
+namespace ZelUtils {
+// The key of the empty text.
+template <>
+STYLES_API const PooledString<Styles::StringPool> PooledString<Styles::StringPool>::Empty;
+} // namespace ZelUtils

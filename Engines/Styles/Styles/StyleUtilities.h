@@ -1,0 +1,50 @@
+// Free functions of the style library: property paths (sequences of keys that
+// lead through substyles to a property), the category key of ordinary styles
+// and the cleaning of user-typed style names.
+#pragma once
+
+#include <Styles/Export.h>
+#include <Styles/Style.h>
+
+#include <set>
+#include <vector>
+
+namespace Styles {
+
+// The key of the category of ordinary (top-level) styles, "style".
+STYLES_API extern const PropertyKey StyleCategoryName;
+
+// A path of keys from the outermost style to a property; every key but the
+// last names a substyle-holding property.
+using PropertyPath = std::vector<PropertyKey>;
+
+// Path builders; each result is allocated once at its final length.
+STYLES_API PropertyPath MakePath(const PropertyKey& a);
+STYLES_API PropertyPath MakePath(const PropertyKey& a, const PropertyKey& b);
+STYLES_API PropertyPath MakePath(const PropertyKey& a, const PropertyKey& b, const PropertyKey& c);
+STYLES_API PropertyPath MakePath(const PropertyPath& path, const PropertyKey& key);
+STYLES_API PropertyPath MakePath(const PropertyKey& key, const PropertyPath& path);
+STYLES_API PropertyPath MakePath(const PropertyPath& first, const PropertyPath& second);
+
+// One one-key path per key, in the set's (identity) order.
+STYLES_API std::vector<PropertyPath> MakePaths(const std::set<PropertyKey>& keys);
+// One one-key path per key, in the vector's order, repeats kept.
+STYLES_API std::vector<PropertyPath> MakePaths(const std::vector<PropertyKey>& keys);
+
+// The path whose keys are the pieces of `text` between "." characters. Every
+// piece is interned as it is; empty pieces become the empty key.
+STYLES_API PropertyPath SplitPath(const ZelStringT<char16_t>& text);
+
+// The own single substyle of `style` under `setKey`, created empty from the
+// behaviour's element category when missing; null, with nothing changed,
+// when the key has no behaviour. Owned by `style`.
+STYLES_API Style* GetOrCreateSubstyle(Style& style, const PropertyKey& setKey);
+
+// A copy of `name` fit to be a style or preset name. Strict mode keeps only
+// printable ASCII letters, digits, space and safe punctuation; lenient mode
+// removes tab, line feed, double quote and tilde. Both trim white space at
+// the ends afterwards; the result may be empty.
+STYLES_API ZelStringT<char16_t> ConvertToValidStyleName(const ZelStringT<char16_t>& name,
+                                                        bool restrictToAllowedCharacters);
+
+} // namespace Styles

@@ -1,0 +1,115 @@
+#include <Styles/StyleUtilities.h>
+
+#include <gtest/gtest.h>
+
+#include <string>
+
+namespace Styles {
+namespace {
+
+std::string Narrow(std::u16string_view text) { return std::string(text.begin(), text.end()); }
+
+TEST(StyleUtilitiesTest, MakePathKeepsArgumentOrderAndRepeats) {
+  const PropertyKey a(u"a"), b(u"b"), c(u"c");
+  EXPECT_EQ(MakePath(a), PropertyPath({a}));
+  EXPECT_EQ(MakePath(a, a), PropertyPath({a, a}));
+  EXPECT_EQ(MakePath(c, a, b), PropertyPath({c, a, b}));
+  EXPECT_EQ(MakePath(PropertyPath{a, b}, c), PropertyPath({a, b, c}));
+  EXPECT_EQ(MakePath(c, PropertyPath{a, b}), PropertyPath({c, a, b}));
+  EXPECT_EQ(MakePath(PropertyPath{b}, PropertyPath{a, c}), PropertyPath({b, a, c}));
+  EXPECT_EQ(MakePath(PropertyPath{}, c), PropertyPath({c}));
+  EXPECT_TRUE(MakePath(PropertyPath{}, PropertyPath{}).empty());
+}
+
+TEST(StyleUtilitiesTest, MakePathAllocatesExactly) {
+  const PropertyKey a(u"a"), b(u"b");
+  const PropertyPath joined = MakePath(PropertyPath{a, b, a}, PropertyPath{b, b});
+  EXPECT_EQ(joined.size(), 5u);
+  EXPECT_EQ(joined.capacity(), 5u);
+}
+
+TEST(StyleUtilitiesTest, MakePathsFollowsContainerOrder) {
+  const PropertyKey a(u"a"), b(u"b");
+  EXPECT_TRUE(MakePaths(std::set<PropertyKey>{}).empty());
+  EXPECT_TRUE(MakePaths(std::vector<PropertyKey>{}).empty());
+  EXPECT_EQ(MakePaths(std::vector<PropertyKey>{b, a, b}),
+            (std::vector<PropertyPath>{{b}, {a}, {b}}));
+  // A set iterates in identity order, whatever the texts are.
+  const std::set<PropertyKey> keys{b, a};
+  const std::vector<PropertyPath> paths = MakePaths(keys);
+  ASSERT_EQ(paths.size(), 2u);
+  EXPECT_EQ(paths[0], PropertyPath{*keys.begin()});
+  EXPECT_EQ(paths[1], PropertyPath{*keys.rbegin()});
+}
+
+TEST(StyleUtilitiesTest, SplitPathInternsEveryPiece) {
+  struct Case {
+    const char16_t* text;
+    std::vector<const char16_t*> keys;
+  };
+  for (const Case& c : {Case{u"font", {u"font"}}, Case{u"border.left", {u"border", u"left"}},
+                        Case{u"a.b.c", {u"a", u"b", u"c"}}, Case{u"a..b", {u"a", u"", u"b"}},
+                        Case{u".a", {u"", u"a"}}, Case{u"", {u""}}}) {
+    SCOPED_TRACE(Narrow(c.text));
+    const PropertyPath path = SplitPath(c.text);
+    ASSERT_EQ(path.size(), c.keys.size());
+    for (std::size_t i = 0; i < path.size(); ++i)
+      EXPECT_EQ(path[i], PropertyKey(c.keys[i]));
+  }
+  EXPECT_EQ(SplitPath(u"x.").back(), PropertyKey::Empty);
+}
+
+TEST(StyleUtilitiesTest, StyleCategoryNameIsStyle) {
+  EXPECT_EQ(StyleCategoryName, PropertyKey(u"style"));
+  EXPECT_EQ(StyleCategoryName.ToString(), ZelStringT<char16_t>(u"style"));
+}
+
+TEST(StyleUtilitiesTest, ConvertToValidStyleNameFiltersThenTrims) {
+  struct Case {
+    const char16_t* in;
+    bool strict;
+    const char16_t* expected;
+  };
+  for (const Case& c : {
+           Case{u"Caf\u00e9 Title", true, u"Caf Title"},
+           Case{u"Caf\u00e9 Title", false, u"Caf\u00e9 Title"},
+           Case{u"a\tb\"c\nd~e", true, u"abcde"},
+           Case{u"a\tb\"c\nd~e", false, u"abcde"},
+           Case{u"back\\slash <x>", true, u"backslash x"},
+           Case{u"back\\slash <x>", false, u"back\\slash <x>"},
+           Case{u"\"  inner  space \"", true, u"inner  space"},
+           Case{u"~ edge ~", false, u"edge"},
+           Case{u"\u00e9 x \u00e9", true, u"x"},
+           Case{u"line\rfeed", false, u"line\rfeed"},
+           Case{u"line\rfeed", true, u"linefeed"},
+           Case{u"\u65e5\u672c", true, u""},
+           Case{u"", true, u""},
+           Case{u"", false, u""},
+           Case{u" \t \u00a0 ", true, u""},
+           Case{u" \u3000 ", false, u""},
+           Case{u"\u3000Heading\u3000", false, u"Heading"},
+       }) {
+    SCOPED_TRACE(Narrow(c.in) + (c.strict ? " strict" : " lenient"));
+    EXPECT_EQ(ConvertToValidStyleName(c.in, c.strict), ZelStringT<char16_t>(c.expected));
+  }
+}
+
+TEST(StyleUtilitiesTest, StrictModeKeepsExactlyTheAllowedSet) {
+  const std::u16string allowed =
+      u" 0123456789abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ()[]{}'|!@#$%^&*-_.,?/+=:;`";
+  std::u16string everyAscii;
+  for (char16_t c = 1; c < 0x80; ++c)
+    everyAscii.push_back(c);
+  // Wrapped in letters so that trimming does not hide a kept space.
+  const ZelStringT<char16_t> kept = ConvertToValidStyleName(u"x" + everyAscii + u"x", true);
+  std::u16string expected = u"x";
+  for (char16_t c : everyAscii)
+    if (allowed.find(c) != std::u16string::npos)
+      expected.push_back(c);
+  expected.push_back(u'x');
+  EXPECT_EQ(kept, ZelStringT<char16_t>(expected));
+  EXPECT_EQ(kept.GetLength(), 92u);
+}
+
+} // namespace
+} // namespace Styles
