@@ -1,0 +1,63 @@
+// A style category: one named set of property behaviours. Every style belongs
+// to one category, which says which properties exist for it and which
+// behaviour governs each. Categories are created and owned by the manager.
+#pragma once
+
+#include <Styles/Export.h>
+#include <Styles/Style.h>
+
+#include <ZelPlatform/ZelString.h>
+#include <ZelUtils/Any.h>
+
+#include <map>
+#include <vector>
+
+namespace ZelPref {
+class ConversionPolicy;
+}
+
+namespace Styles {
+
+class BaseStyleProperty;
+
+class STYLES_API StyleCategory {
+public:
+  // `flag` is kept for the host; the library never reads it.
+  StyleCategory(const PropertyKey& key, const ZelStringT<char16_t>& uiName, bool flag);
+  StyleCategory(const StyleCategory&) = delete;
+  StyleCategory& operator=(const StyleCategory&) = delete;
+  // Frees only the containers: behaviours are deleted by PreDestroyProperties.
+  virtual ~StyleCategory();
+
+  // Takes ownership of `property` under `key`. The first registration wins: a
+  // second one for the same key is ignored and the caller keeps its object.
+  void RegisterProperty(const PropertyKey& key, BaseStyleProperty* property);
+  // The behaviour registered under `key`, or null. Not owned by the caller.
+  BaseStyleProperty* GetStyleProperty(const PropertyKey& key) const;
+  // The behaviour's default value, one stable object per key. Throws
+  // std::exception when no behaviour is registered under `key`.
+  const ZelUtils::Any& GetDefaultValue(const PropertyKey& key) const;
+  // The behaviour's conversion policy; null for an unknown key.
+  ZelPref::ConversionPolicy* GetConversionPolicy(const PropertyKey& key) const;
+  // Deletes every behaviour and empties the map; the registration order stays.
+  void PreDestroyProperties();
+
+  const PropertyKey& GetKey() const noexcept { return m_key; }
+  const ZelStringT<char16_t>& GetUIName() const noexcept { return m_uiName; }
+  bool GetFlag() const noexcept { return m_flag; }
+  // Property keys in registration order.
+  const std::vector<PropertyKey>& GetPropertyOrder() const noexcept { return m_propertyOrder; }
+  // The behaviours in key (identity) order.
+  const std::map<PropertyKey, BaseStyleProperty*>& GetProperties() const noexcept {
+    return m_properties;
+  }
+
+private:
+  PropertyKey m_key;
+  ZelStringT<char16_t> m_uiName;
+  std::vector<PropertyKey> m_propertyOrder;
+  std::map<PropertyKey, BaseStyleProperty*> m_properties;
+  bool m_flag;
+};
+
+} // namespace Styles

@@ -1,0 +1,149 @@
+// Property behaviours: the strategy objects that give the values of one
+// property their meaning. A style never interprets a value itself; it asks
+// the behaviour its category registers for the key to copy, destroy, compare,
+// merge, flatten, walk and serialize the value. Hosts subclass these classes:
+// the order of the virtual operations is part of the interface.
+#pragma once
+
+#include <Styles/Export.h>
+#include <Styles/Style.h>
+
+#include <ZelPlatform/ZelString.h>
+#include <ZelUtils/Any.h>
+#include <ZelUtils/Delegate.h>
+#include <ZelUtils/Span.h>
+
+#include <functional>
+#include <map>
+#include <utility>
+#include <vector>
+
+namespace ZelPref {
+class ConversionPolicy;
+}
+
+namespace Styles {
+
+class StyleSheet;
+
+// Optional check of values, owned by the behaviour it is given to.
+class STYLES_API PropertyValidator {
+public:
+  virtual ~PropertyValidator();
+  // Whether `value` is acceptable; it may be adjusted in place.
+  virtual bool Validate(ZelUtils::Any& value, const ZelUtils::Any& defaultValue) const = 0;
+};
+
+// The interface of every behaviour, with defaults that fit plain values.
+class STYLES_API BaseStyleProperty {
+public:
+  explicit BaseStyleProperty(ZelUtils::Any defaultValue, int minimumVersion = 0);
+  BaseStyleProperty(const BaseStyleProperty&) = delete;
+  BaseStyleProperty& operator=(const BaseStyleProperty&) = delete;
+
+  // Deletes the validator; the default value goes with the object.
+  virtual ~BaseStyleProperty();
+  // The category of the substyles this property holds; empty for plain values.
+  virtual PropertyKey GetElementCategoryName() const;
+  // Writes `value` into `out`; false leaves the property out of the document.
+  virtual bool Serialize(const StyleSheet& sheet, const Style* style, const ZelUtils::Any& value,
+                         JsonValue& out) const = 0;
+  // Reads `in` and stores the result in `style`; false when nothing was stored.
+  virtual bool Deserialize(const StyleSheet& sheet, Style* style, const JsonValue& in) const = 0;
+  // True makes style reading call AdjustAfterDeserialize once the style is read.
+  virtual bool NeedAdjustementsForStyleIO() const;
+  virtual void AdjustAfterDeserialize(const StyleSheet& sheet, Style* style) const;
+  // The policy that turns values into text and back; not owned by the caller.
+  virtual ZelPref::ConversionPolicy* GetConversionPolicy() const;
+  // Releases what a stored value owns (owned substyles); plain values own nothing.
+  virtual void DestroyPropertyData(const ZelUtils::Any& value) const;
+  // Turns a value about to be stored in `owner` into the value to store; an
+  // empty result stores nothing.
+  virtual ZelUtils::Any MovePropertyData(Style* owner, ZelUtils::Any&& value) const;
+  virtual std::vector<Style*> GetDependencies(const ZelUtils::Any& value, StyleSpan styles,
+                                              bool parentOnly) const;
+  virtual bool HasDependency(const ZelUtils::Any& value, StyleSpan styles, bool parentOnly) const;
+  virtual void RemoveDependency(ZelUtils::Any& value, StyleSpan styles, bool parentOnly) const;
+  virtual bool HasParentalDependency(const ZelUtils::Any& value) const;
+  virtual void RemoveAllDependencies(ZelUtils::Any& value) const;
+  virtual void RemapDependency(ZelUtils::Any& value, const std::map<Style*, Style*>& map) const;
+  virtual void
+  RemapPointer(ZelUtils::Any& value,
+               const std::vector<std::pair<ZelUtils::Any, ZelUtils::Any>>& pairs) const;
+  // Points the substyles held in `value` back at their holder.
+  virtual void SetOwner(ZelUtils::Any& value, Style* owner, const PropertyKey& key) const;
+  // Calls `fn` on the value (plain values) or inside the substyles it holds.
+  virtual bool ProcessProperty(ZelUtils::Any& value, const PropertyVisitor& fn, Style* style,
+                               const PropertyKey& key) const;
+  // Unless `overwrite` is false and `target` sets `key` itself, the effective
+  // value of `source` becomes `target`'s own value.
+  virtual void MergeProperty(Style* target, const Style* source, const PropertyKey& key,
+                             bool overwrite) const;
+  // Unless `target` sets `key` itself, a non-default value found on `parent`
+  // becomes `target`'s own value.
+  virtual void MergeParentProperty(Style* target, const Style* parent,
+                                   const PropertyKey& key) const;
+  // Makes the effective value of `key` the style's own; true when one was found.
+  virtual bool FlattenProperty(Style* style, const PropertyKey& key) const;
+  virtual bool IsEqual(const ZelUtils::Any& a, const ZelUtils::Any& b) const;
+  // True makes style reading read this property after all current ones.
+  virtual bool IsDeprecated() const;
+  virtual bool IsLess(const ZelUtils::Any& a, const ZelUtils::Any& b) const;
+  // Calls `fn` on every substyle held in `value`; plain values report false.
+  virtual bool ProcessStylesInProperty(const ZelUtils::Any& value, const StyleVisitor& fn) const;
+  // Whether `value` has the kind this property accepts.
+  virtual bool CheckType(const ZelUtils::Any& value) const = 0;
+  // True leaves the property out of written styles unless asked otherwise.
+  virtual bool IsTemporary() const;
+  // True for a property that holds one substyle.
+  virtual bool IsSubstyle() const;
+
+  // Called by the manager when the behaviour is registered.
+  void SetName(const PropertyKey& categoryKey, const PropertyKey& name);
+  const PropertyKey& GetCategoryKey() const noexcept { return m_categoryKey; }
+  const PropertyKey& GetName() const noexcept { return m_name; }
+  // One stable object per behaviour: lookups compare addresses with it.
+  const ZelUtils::Any& GetDefaultValue() const noexcept { return m_defaultValue; }
+  int GetMinimumVersion() const noexcept { return m_minimumVersion; }
+  // Takes ownership of `validator` (may be null), deleting the previous one.
+  void SetValidator(PropertyValidator* validator);
+  // False without a validator; otherwise the validator's verdict.
+  bool Validate(ZelUtils::Any& value) const;
+
+private:
+  PropertyKey m_categoryKey;
+  PropertyKey m_name;
+  PropertyValidator* m_validator = nullptr;
+  ZelUtils::Any m_defaultValue;
+  int m_minimumVersion;
+};
+
+// The behaviour of a plain value whose JSON form is the text that its
+// conversion policy makes.
+class STYLES_API StyleProperty : public BaseStyleProperty {
+public:
+  using TypeCheck = bool (*)(const ZelUtils::Any&);
+
+  // Takes ownership of `policy` (may be null: the value is then written as
+  // null and never read). `typeCheck` decides CheckType; null accepts nothing.
+  StyleProperty(ZelUtils::Any defaultValue, ZelPref::ConversionPolicy* policy, TypeCheck typeCheck,
+                int minimumVersion = 0);
+  ~StyleProperty() override;
+
+  // Not written (false) for a sheet older than the minimum version.
+  bool Serialize(const StyleSheet& sheet, const Style* style, const ZelUtils::Any& value,
+                 JsonValue& out) const override;
+  // Reads a string, a number (as "%g" text) or a bool ("1"/"0") through the
+  // policy. Unreadable text for "xScale"/"yScale" stores 1, for "angle"/"skew"
+  // stores 0, so that old documents still load; for other names the
+  // policy's ZelPref::Detail::BadConversion is thrown on.
+  bool Deserialize(const StyleSheet& sheet, Style* style, const JsonValue& in) const override;
+  ZelPref::ConversionPolicy* GetConversionPolicy() const override;
+  bool CheckType(const ZelUtils::Any& value) const override;
+
+private:
+  ZelPref::ConversionPolicy* m_policy;
+  TypeCheck m_typeCheck;
+};
+
+} // namespace Styles
