@@ -1,0 +1,247 @@
+// Json: the platform's JSON value model and its text form. A Value is one of
+// null, UTF-16 string, Object, number (double), bool, Array or UTF-8 string.
+// Objects keep their members in insertion order and allow repeated names.
+// Parse reads UTF-16 JSON text into a Value; ValueToString writes one back, so
+// that Parse(ValueToString(v, format)) gives v again for either format.
+#pragma once
+
+#include <ZelPlatform/Export.h>
+#include <ZelPlatform/ZelString.h>
+#include <ZelUtils/Variant.h>
+
+#include <cassert>
+#include <cstddef>
+#include <string_view>
+#include <type_traits>
+#include <utility>
+#include <vector>
+
+namespace Json {
+
+// Parse rejects text whose objects and arrays nest deeper than this; the
+// limit bounds the work and the stack needed by anything that walks a parsed
+// value recursively.
+constexpr int kMaxDepth = 512;
+
+// The JSON null; all nulls are equal.
+struct NullType {
+  friend bool operator==(NullType, NullType) noexcept { return true; }
+  friend bool operator!=(NullType, NullType) noexcept { return false; }
+};
+
+class Value;
+struct Member;
+
+// A JSON object: (name, value) members in insertion order. Repeated names are
+// kept; Find returns the first. Equality compares members in order.
+class Object {
+public:
+  using iterator = std::vector<Member>::iterator;
+  using const_iterator = std::vector<Member>::const_iterator;
+
+  Object() noexcept;
+  Object(const Object& other);
+  Object(Object&& other) noexcept;
+  Object& operator=(const Object& other);
+  Object& operator=(Object&& other) noexcept;
+  ~Object();
+
+  // Takes the members as they are, in their order.
+  explicit Object(std::vector<Member>&& members) noexcept;
+
+  std::size_t GetSize() const noexcept;
+  bool IsEmpty() const noexcept;
+  // Name and value of member i; i must be below GetSize().
+  const ZelStringT<char16_t>& GetValueName(std::size_t i) const;
+  const Value& GetValue(std::size_t i) const;
+  Value& GetValue(std::size_t i);
+  // Appends a member after the existing ones, even when the name is taken.
+  void AddValue(ZelStringT<char16_t> name, Value value);
+  void Reserve(std::size_t count);
+  // The value of the first member called name, or null; not owned.
+  const Value* Find(std::u16string_view name) const noexcept;
+  Value* Find(std::u16string_view name) noexcept;
+
+  iterator begin() noexcept;
+  iterator end() noexcept;
+  const_iterator begin() const noexcept;
+  const_iterator end() const noexcept;
+
+  friend bool operator==(const Object& a, const Object& b);
+  friend bool operator!=(const Object& a, const Object& b);
+
+private:
+  std::vector<Member> m_members;
+};
+
+// A JSON array: values in order. Equality compares element by element.
+class Array {
+public:
+  using iterator = std::vector<Value>::iterator;
+  using const_iterator = std::vector<Value>::const_iterator;
+
+  Array() noexcept;
+  Array(const Array& other);
+  Array(Array&& other) noexcept;
+  Array& operator=(const Array& other);
+  Array& operator=(Array&& other) noexcept;
+  ~Array();
+
+  // Takes the values as they are, in their order.
+  explicit Array(std::vector<Value>&& values) noexcept;
+
+  std::size_t GetSize() const noexcept;
+  bool IsEmpty() const noexcept;
+  // Value i; i must be below GetSize().
+  const Value& GetValue(std::size_t i) const;
+  Value& GetValue(std::size_t i);
+  void AddValue(Value value);
+  void Reserve(std::size_t count);
+
+  iterator begin() noexcept;
+  iterator end() noexcept;
+  const_iterator begin() const noexcept;
+  const_iterator end() const noexcept;
+
+  friend bool operator==(const Array& a, const Array& b);
+  friend bool operator!=(const Array& a, const Array& b);
+
+private:
+  std::vector<Value> m_values;
+};
+
+namespace detail {
+template <class T>
+constexpr bool kIsNumber =
+    std::is_arithmetic<T>::value && !std::is_same<T, bool>::value &&
+    !std::is_same<T, char>::value && !std::is_same<T, signed char>::value &&
+    !std::is_same<T, unsigned char>::value && !std::is_same<T, wchar_t>::value &&
+    !std::is_same<T, char16_t>::value && !std::is_same<T, char32_t>::value;
+} // namespace detail
+
+using ValueBase = ZelUtils::Variant<NullType, ZelStringT<char16_t>, Object, double, bool, Array,
+                                    ZelStringT<char>>;
+
+// One JSON value; a default-constructed value is null. Every number is held as
+// a double. ZelStringT<char> holds UTF-8 text and is written as a string.
+// Get<T>() throws std::bad_cast when another kind is held.
+class Value : public ValueBase {
+public:
+  Value() = default;
+  Value(NullType) noexcept {}
+  Value(std::nullptr_t) = delete;
+  Value(const char16_t* text) : ValueBase(ZelStringT<char16_t>(text)) {}
+  Value(ZelStringT<char16_t> text) noexcept : ValueBase(std::move(text)) {}
+  Value(ZelStringT<char> utf8Text) noexcept : ValueBase(std::move(utf8Text)) {}
+  Value(Object object) noexcept : ValueBase(std::move(object)) {}
+  Value(Array array) noexcept : ValueBase(std::move(array)) {}
+  // Any integer or floating-point number becomes a double.
+  template <class T, std::enable_if_t<detail::kIsNumber<T>, int> = 0>
+  Value(T number) noexcept : ValueBase(static_cast<double>(number)) {}
+  // Only a real bool; pointers and numbers never turn into one.
+  template <class T, std::enable_if_t<std::is_same<T, bool>::value, int> = 0>
+  Value(T flag) noexcept : ValueBase(flag) {}
+
+  bool IsNull() const noexcept { return Is<NullType>(); }
+};
+
+// One member of an Object.
+struct Member {
+  ZelStringT<char16_t> name;
+  Value value;
+
+  friend bool operator==(const Member& a, const Member& b) {
+    return a.name == b.name && a.value == b.value;
+  }
+  friend bool operator!=(const Member& a, const Member& b) { return !(a == b); }
+};
+
+// Parses the whole of text as one JSON value into out. Returns false for text
+// that is not exactly one valid JSON value (trailing text, unpaired surrogates,
+// nesting deeper than kMaxDepth, a number too big for a double); then out is
+// unchanged and errorText holds a message with the offset in code units. Does
+// not throw for bad text. Numbers are correctly rounded; one too small for a
+// double becomes zero of its sign. A leading byte order mark (U+FEFF) is
+// skipped. On success errorText is cleared.
+ZEL_API bool Parse(const ZelStringT<char16_t>& text, Value& out, ZelStringT<char16_t>& errorText);
+
+// The JSON text of value: compact when format is false, indented by two spaces
+// per level when true. Numbers are written in the shortest form that reads back
+// to the same double (integers without fraction, -0 as "-0.0"); NaN and
+// infinities are written as null; unpaired surrogates in strings become
+// U+FFFD and invalid UTF-8 in ZelStringT<char> values does too. Returns an
+// empty string if the text cannot be produced.
+ZEL_API ZelStringT<char16_t> ValueToString(const Value& value, bool format);
+
+// Inline definitions that need Value and Member complete.
+
+inline Object::Object() noexcept = default;
+inline Object::Object(const Object& other) = default;
+inline Object::Object(Object&& other) noexcept = default;
+inline Object& Object::operator=(const Object& other) = default;
+inline Object& Object::operator=(Object&& other) noexcept = default;
+inline Object::~Object() = default;
+inline Object::Object(std::vector<Member>&& members) noexcept : m_members(std::move(members)) {}
+
+inline std::size_t Object::GetSize() const noexcept { return m_members.size(); }
+inline bool Object::IsEmpty() const noexcept { return m_members.empty(); }
+inline const ZelStringT<char16_t>& Object::GetValueName(std::size_t i) const {
+  assert(i < m_members.size());
+  return m_members[i].name;
+}
+inline const Value& Object::GetValue(std::size_t i) const {
+  assert(i < m_members.size());
+  return m_members[i].value;
+}
+inline Value& Object::GetValue(std::size_t i) {
+  assert(i < m_members.size());
+  return m_members[i].value;
+}
+inline void Object::AddValue(ZelStringT<char16_t> name, Value value) {
+  m_members.push_back(Member{std::move(name), std::move(value)});
+}
+inline void Object::Reserve(std::size_t count) { m_members.reserve(count); }
+inline const Value* Object::Find(std::u16string_view name) const noexcept {
+  for (const Member& member : m_members)
+    if (member.name.GetView() == name)
+      return &member.value;
+  return nullptr;
+}
+inline Value* Object::Find(std::u16string_view name) noexcept {
+  return const_cast<Value*>(static_cast<const Object&>(*this).Find(name));
+}
+inline Object::iterator Object::begin() noexcept { return m_members.begin(); }
+inline Object::iterator Object::end() noexcept { return m_members.end(); }
+inline Object::const_iterator Object::begin() const noexcept { return m_members.begin(); }
+inline Object::const_iterator Object::end() const noexcept { return m_members.end(); }
+inline bool operator==(const Object& a, const Object& b) { return a.m_members == b.m_members; }
+inline bool operator!=(const Object& a, const Object& b) { return !(a == b); }
+
+inline Array::Array() noexcept = default;
+inline Array::Array(const Array& other) = default;
+inline Array::Array(Array&& other) noexcept = default;
+inline Array& Array::operator=(const Array& other) = default;
+inline Array& Array::operator=(Array&& other) noexcept = default;
+inline Array::~Array() = default;
+inline Array::Array(std::vector<Value>&& values) noexcept : m_values(std::move(values)) {}
+
+inline std::size_t Array::GetSize() const noexcept { return m_values.size(); }
+inline bool Array::IsEmpty() const noexcept { return m_values.empty(); }
+inline const Value& Array::GetValue(std::size_t i) const {
+  assert(i < m_values.size());
+  return m_values[i];
+}
+inline Value& Array::GetValue(std::size_t i) {
+  assert(i < m_values.size());
+  return m_values[i];
+}
+inline void Array::AddValue(Value value) { m_values.push_back(std::move(value)); }
+inline void Array::Reserve(std::size_t count) { m_values.reserve(count); }
+inline Array::iterator Array::begin() noexcept { return m_values.begin(); }
+inline Array::iterator Array::end() noexcept { return m_values.end(); }
+inline Array::const_iterator Array::begin() const noexcept { return m_values.begin(); }
+inline Array::const_iterator Array::end() const noexcept { return m_values.end(); }
+inline bool operator==(const Array& a, const Array& b) { return a.m_values == b.m_values; }
+inline bool operator!=(const Array& a, const Array& b) { return !(a == b); }
+
+} // namespace Json
