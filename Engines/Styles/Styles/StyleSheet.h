@@ -1,0 +1,150 @@
+// The style sheet: a named collection of styles that owns the styles put into
+// it, finds them by a case-insensitive name and by pointer, keeps a format
+// version and an external ID, repairs references when styles are deleted, and
+// is written to and read from one JSON document (text or stream).
+#pragma once
+
+#include <Styles/Export.h>
+#include <Styles/Style.h>
+
+#include <ZelPlatform/ZelString.h>
+#include <ZelUtils/Stream.h>
+#include <ZelUtils/String.h>
+
+#include <map>
+#include <memory>
+#include <vector>
+
+namespace Styles {
+
+// Told about every style that StyleSheet::CopyContentsFrom creates.
+class STYLES_API IStyleSheetDuplicationContext {
+public:
+  virtual ~IStyleSheetDuplicationContext();
+  // Called once per style of the copy, in name order; `style` belongs to the
+  // sheet. The sheet always passes 0 as `reserved` and ignores the result.
+  virtual bool OnStyleDuplicated(Style* style, int reserved) = 0;
+};
+
+class STYLES_API StyleSheet {
+public:
+  // Style names ordered ignoring letter case; two names differing only in
+  // case are the same key.
+  using NameIndex =
+      std::map<ZelStringT<char16_t>, Style*, ZelUtils::String::LessThanCaseInsensitive>;
+  // Styles ordered by address, mapped to the name they are filed under.
+  using PointerIndex = std::map<const Style*, ZelStringT<char16_t>>;
+  // Styles of one category by name, ordered ignoring letter case.
+  using CategoryStyleMap = std::map<PropertyKey, NameIndex>;
+
+  // An empty sheet of the manager's current version, without external ID.
+  StyleSheet();
+  StyleSheet(const StyleSheet&) = delete;
+  StyleSheet& operator=(const StyleSheet&) = delete;
+
+  // Destroys every style of the sheet.
+  virtual ~StyleSheet();
+  // A copy of the identifier of the external source the sheet stands for.
+  virtual ZelStringT<char16_t> GetExternalID() const;
+  // Replaces `text` with the JSON document of the sheet; temporary properties
+  // are written only with `includeTemporary`.
+  virtual void ExportToString(ZelStringT<char16_t>& text, bool includeTemporary) const;
+  // Parses `text` and imports it (see ImportJson). False, with the sheet
+  // unchanged, when the text is not JSON or not a JSON object; exceptions
+  // thrown while importing pass through.
+  virtual bool ImportFromString(const ZelStringT<char16_t>& text, bool replace);
+  // Adds the document's members to the Json::Object that `out` already holds
+  // (std::bad_cast when it holds something else).
+  virtual void ExportJson(JsonValue& out, bool includeTemporary) const;
+  // Adds the styles of `document` (not owned) to the sheet; `replace` decides
+  // who wins a name clash, as in AddStyle. Sets the version from the document
+  // (0 when it has none) and takes the document's "id" only when the sheet
+  // already has an external ID. Returns true. Throws std::bad_cast for a
+  // style member that is not an object; behaviour exceptions pass through.
+  virtual bool ImportJson(Json::Object* document, bool replace);
+  virtual void SetExternalID(const ZelStringT<char16_t>& id);
+
+  int GetVersion() const noexcept { return m_version; }
+  void SetVersion(int version) noexcept { m_version = version; }
+
+  // Destroys every style (in name order), empties the sheet and resets the
+  // version to the manager's current version. The external ID stays.
+  void Clear();
+
+  // Files `style` under `name`; the sheet takes ownership of `style` in every
+  // case. With `replace`, a style already filed under `name` (in any letter
+  // case) is detached and returned: the caller owns it and should destroy it.
+  // Without, a clash destroys `style` and keeps the existing one. Returns null
+  // when nothing was replaced. The name is taken as it is, even empty.
+  Style* AddStyle(const ZelStringT<char16_t>& name, Style* style, bool replace);
+  // Detaches the style filed under `name` and returns it (the caller owns it
+  // from now on), or null. Styles that refer to it are not repaired.
+  Style* RemoveStyle(const ZelStringT<char16_t>& name);
+  // Detaches `style`; the caller, holding the pointer, owns it. False when it
+  // is null or not in the sheet.
+  bool RemoveStyle(Style* style);
+  // Makes every style of the sheet drop its references to the styles of
+  // `styles`, then destroys those of them that belong to the sheet. Null and
+  // foreign pointers are skipped (foreign styles are not destroyed).
+  void DeleteStyles(StyleSpan styles);
+  // Files the style called `oldName` under `newName`. Does nothing when no
+  // style is called `oldName`, or when another style is already called
+  // `newName`; a change of letter case only re-spells the name.
+  void RenameStyle(const ZelStringT<char16_t>& oldName, const ZelStringT<char16_t>& newName);
+  // Offers each of this sheet's own styles back to this sheet's AddStyle
+  // under its own name and destroys what AddStyle returns, then forgets the
+  // names of `other`'s styles (they are neither moved nor destroyed). Kept as
+  // it always behaved: after the call, this sheet's styles must not be used.
+  void MergeIn(StyleSheet& other, bool replace);
+
+  // Queries; styles returned stay owned by the sheet.
+  // The style filed under `name` in any letter case, or null.
+  Style* GetStyle(const ZelStringT<char16_t>& name) const;
+  // Every style, in name order.
+  std::vector<Style*> GetStyles() const;
+  // The styles of `names`, in that order; unknown names are skipped.
+  std::vector<Style*> GetStylesByName(const std::vector<ZelStringT<char16_t>>& names) const;
+  // The styles of `category`, in name order.
+  std::vector<Style*> GetStylesByCategory(const PropertyKey& category) const;
+  // The name `style` is filed under; empty when it is null or not in the sheet.
+  ZelStringT<char16_t> GetStyleName(const Style* style) const;
+  // Every name as stored, in name order.
+  std::vector<ZelStringT<char16_t>> GetStyleNames() const;
+  // The names of the styles of `category`, in name order.
+  std::vector<ZelStringT<char16_t>> GetStyleNames(const PropertyKey& category) const;
+  // The styles whose parent is exactly `parent`; empty for null.
+  NameIndex GetChildStyles(const Style* parent) const;
+  // Empties `out`, then files every style under its category (the empty key
+  // for a style without one).
+  void GenerateCategoryStyleMap(CategoryStyleMap& out) const;
+  // Appends to `out`, in name order, every style of the sheet that depends on
+  // a style of `styles` (through its whole parent chain).
+  void GetDependencies(StyleSpan styles, std::vector<Style*>& out) const;
+  // The first style, in name order, with exactly this external ID and
+  // external name; null when either is empty or none matches.
+  Style* GetExternalStyleAlias(const ZelStringT<char16_t>& externalID,
+                               const ZelStringT<char16_t>& externalName) const;
+
+  // `proposed` when no style has that name, else a numbered variant of it. A
+  // registered category's name is first turned into its UI name plus " 1".
+  ZelStringT<char16_t> GetUnusedStyleName(const ZelStringT<char16_t>& proposed) const;
+  // Makes this sheet a deep copy of `source` by way of its JSON text, tells
+  // `context` (not owned; may be null) about every new style and takes the
+  // source's version.
+  void CopyContentsFrom(const StyleSheet& source, IStyleSheetDuplicationContext* context);
+
+  // Writes the document text (without temporary properties) as UTF-8; false
+  // when the stream refuses the text.
+  bool Export(ZelUtils::Stream& stream) const;
+  // Reads the whole stream as UTF-8 text and imports it; ImportFromString's
+  // result.
+  bool Import(ZelUtils::Stream& stream, bool replace);
+
+private:
+  std::unique_ptr<NameIndex> m_styles;
+  std::unique_ptr<PointerIndex> m_names;
+  int m_version;
+  ZelStringT<char16_t> m_externalID;
+};
+
+} // namespace Styles
