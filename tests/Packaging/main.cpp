@@ -1,0 +1,38 @@
+// The README's first example; exits non-zero when it does not print what the
+// README says.
+#include <Styles/Styles.h>
+
+#include <cstdio>
+
+using namespace Styles;
+using ZelUtils::Any;
+
+bool IsNumber(const Any& value) { return value.IsTypeCompatible<double>(); }
+
+int main() {
+  const PropertyKey paragraph(u"paragraph");
+  const PropertyKey fontSize(u"fontSize");
+
+  StyleManager& manager = GetStyleManager();
+  manager.SetCurrentVersion(1);
+  manager.RegisterCategory(paragraph, u"Paragraph", false, false);
+  manager.RegisterProperty(paragraph, fontSize,
+                           new StyleProperty(Any(10.0), new ZelPref::NumberConversionPolicy(),
+                                             &IsNumber));
+
+  Style body(nullptr, paragraph);
+  Style heading(&body, paragraph);
+  body.SetProperty(fontSize, Any(11.0));
+  const double size = heading.GetProperty(fontSize).Get<double>();
+  const PropertyPath path = SplitPath(u"border.width");
+
+  StyleSheet sheet;
+  sheet.AddStyle(u"Body", new Style(body), false);
+  ZelStringT<char16_t> json;
+  sheet.ExportToString(json, false);
+
+  const bool ok = size == 11.0 && path.size() == 2 &&
+                  json == u"{\"version\":1,\"paragraph\":{\"Body\":{\"fontSize\":\"11\"}}}";
+  std::puts(ok ? "consumer: ok" : "consumer: unexpected result");
+  return ok ? 0 : 1;
+}
