@@ -8,9 +8,9 @@
 #include <Styles/StyleProperty.h>
 #include <Styles/StyleSheet.h>
 
+#include <ZelPlatform/ZelString.h>
 #include <ZelPref/ConversionPolicy.h>
 #include <ZelUtils/Stream.h>
-#include <ZelUtils/TextStream.h>
 
 #include <cstdio>
 #include <exception>
@@ -46,17 +46,9 @@ bool IsInteger(const Any& value) { return value.GetIf<int>() != nullptr; }
 bool IsFlag(const Any& value) { return value.GetIf<bool>() != nullptr; }
 bool IsText(const Any& value) { return value.GetIf<Text>() != nullptr; }
 
-// UTF-16 to UTF-8 and back through the platform's text streams.
-std::string ToUtf8(const Text& text) {
-  ZelUtils::Stream stream = ZelUtils::MemoryStream::Create();
-  ZelUtils::TextStreamWriter(stream, ZelUtils::TextStream::UTF8, false).Write(text);
-  return ZelUtils::MemoryStream::GetBytes(stream);
-}
-Text FromUtf8(const std::string& bytes) {
-  return ZelUtils::TextStreamReader(ZelUtils::MemoryStream::FromBytes(bytes),
-                                    ZelUtils::TextStream::UTF8)
-      .ReadToEnd();
-}
+// Console and file-system text is UTF-8.
+std::string ToUtf8(const Text& text) { return ZelPlatform::Utf16ToUtf8(text); }
+Text FromUtf8(const std::string& bytes) { return ZelPlatform::Utf8ToUtf16(bytes); }
 
 // The behaviours own their policies; the manager owns the behaviours.
 void AddNumber(const PropertyKey& category, const PropertyKey& key, double initial) {

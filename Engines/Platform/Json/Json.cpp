@@ -73,65 +73,6 @@ void ReplaceUnpairedSurrogates(std::u16string_view text, std::u16string& out) {
   }
 }
 
-// Decodes UTF-8 into out. Each maximal ill-formed subsequence becomes one
-// U+FFFD, as the Unicode standard recommends.
-void Utf8ToUtf16(std::string_view text, std::u16string& out) {
-  out.clear();
-  out.reserve(text.size());
-  const auto* bytes = reinterpret_cast<const unsigned char*>(text.data());
-  const std::size_t size = text.size();
-  std::size_t i = 0;
-  while (i < size) {
-    const unsigned lead = bytes[i++];
-    if (lead < 0x80) {
-      out.push_back(static_cast<char16_t>(lead));
-      continue;
-    }
-    unsigned needed = 0;
-    char32_t code = 0;
-    unsigned low = 0x80, high = 0xBF; // bounds of the second byte
-    if (lead >= 0xC2 && lead <= 0xDF) {
-      needed = 1;
-      code = lead & 0x1F;
-    } else if (lead >= 0xE0 && lead <= 0xEF) {
-      needed = 2;
-      code = lead & 0x0F;
-      if (lead == 0xE0)
-        low = 0xA0;
-      else if (lead == 0xED)
-        high = 0x9F;
-    } else if (lead >= 0xF0 && lead <= 0xF4) {
-      needed = 3;
-      code = lead & 0x07;
-      if (lead == 0xF0)
-        low = 0x90;
-      else if (lead == 0xF4)
-        high = 0x8F;
-    } else {
-      out.push_back(kReplacementCharacter);
-      continue;
-    }
-    bool complete = true;
-    for (unsigned k = 0; k < needed; ++k) {
-      if (i == size || bytes[i] < low || bytes[i] > high) {
-        complete = false;
-        break;
-      }
-      code = (code << 6) | (bytes[i++] & 0x3F);
-      low = 0x80;
-      high = 0xBF;
-    }
-    if (!complete) {
-      out.push_back(kReplacementCharacter);
-    } else if (code >= 0x10000) {
-      code -= 0x10000;
-      out.push_back(static_cast<char16_t>(0xD800 + (code >> 10)));
-      out.push_back(static_cast<char16_t>(0xDC00 + (code & 0x3FF)));
-    } else {
-      out.push_back(static_cast<char16_t>(code));
-    }
-  }
-}
 
 // The decimal exponent of the first non-zero digit of a JSON number, with
 // the exponent part clamped so that it cannot overflow; 0 when all digits are 0.
@@ -356,9 +297,7 @@ private:
     if (const bool* flag = value.GetIf<bool>())
       return m_writer.Bool(*flag);
     if (const auto* utf8 = value.GetIf<ZelStringT<char>>()) {
-      std::u16string wide;
-      Utf8ToUtf16(utf8->GetView(), wide);
-      return WriteText(wide, false);
+      return WriteText(ZelPlatform::Utf8ToUtf16(utf8->GetView()), false);
     }
     return m_writer.Null();
   }

@@ -42,28 +42,6 @@ int FoldedCompare(std::u16string_view a, std::u16string_view b) {
   return Sign(result);
 }
 
-// UTF-8 to UTF-16; ill-formed sequences become U+FFFD.
-std::u16string Utf8ToUtf16(std::string_view text) {
-  std::u16string result;
-  result.reserve(text.size());
-  const auto* bytes = reinterpret_cast<const uint8_t*>(text.data());
-  const auto length = static_cast<int64_t>(text.size());
-  int64_t i = 0;
-  while (i < length) {
-    UChar32 c;
-    U8_NEXT(bytes, i, length, c);
-    if (c < 0)
-      c = kReplacementCharacter;
-    if (U_IS_BMP(c)) {
-      result.push_back(static_cast<char16_t>(c));
-    } else {
-      result.push_back(U16_LEAD(c));
-      result.push_back(U16_TRAIL(c));
-    }
-  }
-  return result;
-}
-
 } // namespace
 
 int CompareNoCaseUtf16(std::u16string_view a, std::u16string_view b) {
@@ -183,4 +161,45 @@ std::string FormatAscii(const char* format, ...) {
 }
 
 } // namespace detail
+
+std::u16string Utf8ToUtf16(std::string_view text) {
+  std::u16string result;
+  result.reserve(text.size());
+  const auto* bytes = reinterpret_cast<const uint8_t*>(text.data());
+  const auto length = static_cast<int64_t>(text.size());
+  int64_t i = 0;
+  while (i < length) {
+    UChar32 c;
+    U8_NEXT(bytes, i, length, c);  // skips a maximal ill-formed subpart at once
+    if (c < 0)
+      c = 0xFFFD;
+    if (U_IS_BMP(c)) {
+      result.push_back(static_cast<char16_t>(c));
+    } else {
+      result.push_back(U16_LEAD(c));
+      result.push_back(U16_TRAIL(c));
+    }
+  }
+  return result;
+}
+
+std::string Utf16ToUtf8(std::u16string_view text) {
+  std::string result;
+  result.reserve(text.size() + text.size() / 2);
+  const char16_t* units = text.data();
+  const auto length = static_cast<int64_t>(text.size());
+  int64_t i = 0;
+  while (i < length) {
+    UChar32 c;
+    U16_NEXT(units, i, length, c);
+    if (U_IS_SURROGATE(c))
+      c = 0xFFFD;
+    uint8_t buffer[U8_MAX_LENGTH];
+    int32_t size = 0;
+    U8_APPEND_UNSAFE(buffer, size, c);
+    result.append(reinterpret_cast<const char*>(buffer), static_cast<std::size_t>(size));
+  }
+  return result;
+}
+
 } // namespace ZelPlatform

@@ -15,6 +15,11 @@
 template <class CharT> using ZelStringViewT = std::basic_string_view<CharT>;
 
 namespace ZelPlatform {
+// UTF-8 to UTF-16; each ill-formed sequence becomes one U+FFFD.
+ZEL_API std::u16string Utf8ToUtf16(std::string_view text);
+// UTF-16 to UTF-8; unpaired surrogates become U+FFFD.
+ZEL_API std::string Utf16ToUtf8(std::u16string_view text);
+
 namespace detail {
 // Full Unicode case-folded comparison (ASCII fast path); <0, 0 or >0.
 ZEL_API int CompareNoCaseUtf16(std::u16string_view a, std::u16string_view b);

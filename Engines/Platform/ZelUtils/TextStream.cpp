@@ -1,5 +1,7 @@
 #include <ZelUtils/TextStream.h>
 
+#include <ZelPlatform/ZelString.h>
+
 #include <cstddef>
 #include <cstdint>
 #include <string>
@@ -44,29 +46,6 @@ void AppendUtf16(std::u16string& out, char32_t codePoint) {
   }
 }
 
-std::string EncodeUtf8(std::u16string_view text) {
-  std::string out;
-  out.reserve(text.size() * 3);
-  ForEachCodePoint(text, [&out](char32_t c) {
-    if (c < 0x80) {
-      out.push_back(static_cast<char>(c));
-    } else if (c < 0x800) {
-      out.push_back(static_cast<char>(0xC0 | (c >> 6)));
-      out.push_back(static_cast<char>(0x80 | (c & 0x3F)));
-    } else if (c < 0x10000) {
-      out.push_back(static_cast<char>(0xE0 | (c >> 12)));
-      out.push_back(static_cast<char>(0x80 | ((c >> 6) & 0x3F)));
-      out.push_back(static_cast<char>(0x80 | (c & 0x3F)));
-    } else {
-      out.push_back(static_cast<char>(0xF0 | (c >> 18)));
-      out.push_back(static_cast<char>(0x80 | ((c >> 12) & 0x3F)));
-      out.push_back(static_cast<char>(0x80 | ((c >> 6) & 0x3F)));
-      out.push_back(static_cast<char>(0x80 | (c & 0x3F)));
-    }
-  });
-  return out;
-}
-
 std::string EncodeUtf16(std::u16string_view text, bool bigEndian) {
   std::string out;
   out.reserve(text.size() * 2);
@@ -84,63 +63,6 @@ std::string EncodeUtf16(std::u16string_view text, bool bigEndian) {
       appendUnit(0xDC00 + ((c - 0x10000) & 0x3FF));
     }
   });
-  return out;
-}
-
-// Decodes UTF-8, replacing each maximal ill-formed subsequence (a stray or
-// invalid byte, an overlong form, an encoded surrogate, a truncated sequence)
-// by one U+FFFD, as the Unicode standard recommends.
-std::u16string DecodeUtf8(std::string_view bytes) {
-  std::u16string out;
-  out.reserve(bytes.size());
-  std::size_t i = 0;
-  while (i < bytes.size()) {
-    const auto lead = static_cast<unsigned char>(bytes[i++]);
-    if (lead < 0x80) {
-      out.push_back(lead);
-      continue;
-    }
-    int trailCount;
-    char32_t codePoint;
-    unsigned char low = 0x80;  // bounds of the first trail byte, which rule
-    unsigned char high = 0xBF; // out overlong forms, surrogates and > U+10FFFF
-    if (lead >= 0xC2 && lead <= 0xDF) {
-      trailCount = 1;
-      codePoint = lead & 0x1F;
-    } else if (lead >= 0xE0 && lead <= 0xEF) {
-      trailCount = 2;
-      codePoint = lead & 0x0F;
-      if (lead == 0xE0)
-        low = 0xA0;
-      else if (lead == 0xED)
-        high = 0x9F;
-    } else if (lead >= 0xF0 && lead <= 0xF4) {
-      trailCount = 3;
-      codePoint = lead & 0x07;
-      if (lead == 0xF0)
-        low = 0x90;
-      else if (lead == 0xF4)
-        high = 0x8F;
-    } else {
-      out.push_back(char16_t(kReplacement));
-      continue;
-    }
-    int read = 0;
-    while (read < trailCount && i < bytes.size()) {
-      const auto trail = static_cast<unsigned char>(bytes[i]);
-      if (trail < low || trail > high)
-        break; // the offending byte starts the next sequence
-      codePoint = (codePoint << 6) | (trail & 0x3F);
-      low = 0x80;
-      high = 0xBF;
-      ++i;
-      ++read;
-    }
-    if (read < trailCount)
-      out.push_back(char16_t(kReplacement));
-    else
-      AppendUtf16(out, codePoint);
-  }
   return out;
 }
 
@@ -189,7 +111,7 @@ bool TextStreamWriter::Write(const ZelStringT<char16_t>& text) {
   if (m_encoding == TextStream::UTF16LE || m_encoding == TextStream::UTF16BE)
     bytes += EncodeUtf16(text.GetView(), m_encoding == TextStream::UTF16BE);
   else
-    bytes += EncodeUtf8(text.GetView());
+    bytes += ZelPlatform::Utf16ToUtf8(text.GetView());
   return m_stream.Write(bytes.data(), bytes.size()) && m_stream.Flush();
 }
 
@@ -206,14 +128,14 @@ ZelStringT<char16_t> TextStreamReader::ReadToEnd() {
 
   std::string_view view(bytes);
   if (StartsWith(view, kUtf8Mark))
-    return DecodeUtf8(view.substr(kUtf8Mark.size()));
+    return ZelPlatform::Utf8ToUtf16(view.substr(kUtf8Mark.size()));
   if (StartsWith(view, kUtf16LEMark))
     return DecodeUtf16(view.substr(kUtf16LEMark.size()), false);
   if (StartsWith(view, kUtf16BEMark))
     return DecodeUtf16(view.substr(kUtf16BEMark.size()), true);
   if (m_encoding == TextStream::UTF16LE || m_encoding == TextStream::UTF16BE)
     return DecodeUtf16(view, m_encoding == TextStream::UTF16BE);
-  return DecodeUtf8(view);
+  return ZelPlatform::Utf8ToUtf16(view);
 }
 
 } // namespace ZelUtils
