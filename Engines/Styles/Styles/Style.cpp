@@ -96,11 +96,7 @@ Style::Style(Style&& other) { *this = std::move(other); }
 Style& Style::operator=(const Style& other) {
   if (&other == this)
     return *this;
-  DestroyOwnValues();
-  m_parent = other.m_parent;
-  m_category = other.m_category;
-  m_externalID = other.m_externalID;
-  m_externalName = other.m_externalName;
+  DestroyValuesAndTakeLinks(other);
   for (const PropertyMap::Entry& entry : other.m_properties) {
     BaseStyleProperty* behaviour = FindBehaviour(entry.first);
     if (!behaviour)
@@ -115,12 +111,8 @@ Style& Style::operator=(const Style& other) {
 Style& Style::operator=(Style&& other) {
   if (&other == this)
     return *this;
-  DestroyOwnValues();
   // Copied, not moved: the source keeps its links, category and strings.
-  m_parent = other.m_parent;
-  m_category = other.m_category;
-  m_externalID = other.m_externalID;
-  m_externalName = other.m_externalName;
+  DestroyValuesAndTakeLinks(other);
   m_properties.Swap(other.m_properties);
   RepairSubstyleOwnerPointers();
   return *this;
@@ -130,6 +122,14 @@ Style::~Style() {
   for (PropertyMap::Entry& entry : m_properties)
     if (BaseStyleProperty* behaviour = FindBehaviour(entry.first))
       behaviour->DestroyPropertyData(entry.second);
+}
+
+void Style::DestroyValuesAndTakeLinks(const Style& source) {
+  DestroyOwnValues();
+  m_parent = source.m_parent;
+  m_category = source.m_category;
+  m_externalID = source.m_externalID;
+  m_externalName = source.m_externalName;
 }
 
 void Style::DestroyOwnValues() {
@@ -162,22 +162,22 @@ PropertyKey Style::GetCategoryName() const noexcept {
   return m_category ? m_category->GetKey() : PropertyKey::Empty;
 }
 
-void Style::SetExternalID(const ZelStringT<char16_t>& id) {
-  m_externalID = id;
+void Style::SetExternalField(ZelStringT<char16_t> Style::*field, const ZelStringT<char16_t>& text) {
+  this->*field = text;
+  // Ordinary styles pass the field on to their direct single substyles only.
   if (GetCategoryName() != StyleCategoryName)
     return;
   for (const PropertyMap::Entry& entry : m_properties)
     if (Style* substyle = GetSubstyle(entry.first, false))
-      substyle->m_externalID = id;
+      substyle->*field = text;
+}
+
+void Style::SetExternalID(const ZelStringT<char16_t>& id) {
+  SetExternalField(&Style::m_externalID, id);
 }
 
 void Style::SetExternalName(const ZelStringT<char16_t>& name) {
-  m_externalName = name;
-  if (GetCategoryName() != StyleCategoryName)
-    return;
-  for (const PropertyMap::Entry& entry : m_properties)
-    if (Style* substyle = GetSubstyle(entry.first, false))
-      substyle->m_externalName = name;
+  SetExternalField(&Style::m_externalName, name);
 }
 
 void Style::RepairSubstyleOwnerPointers() {
@@ -398,7 +398,7 @@ const ZelUtils::Any& Style::GetPathProperty(const std::vector<PropertyKey>& path
 void Style::SetProperty(const PropertyKey& key, const ZelUtils::Any& value) {
   ZelUtils::Any* old = m_properties.Find(key);
   if (old == &value)
-    return;  // already this style's own value
+    return; // already this style's own value
   // Copied before the old value goes, in case `value` lives inside it.
   ZelUtils::Any copy(value);
   BaseStyleProperty* behaviour = FindBehaviour(key);
@@ -485,7 +485,7 @@ Style* Style::CopyProperties(const std::set<PropertyKey>& keys) const {
   std::unique_ptr<Style> copy(new Style(nullptr, GetCategoryName()));
   for (const PropertyKey& key : keys) {
     if (!FindBehaviour(key))
-      continue;  // SetProperty would drop it; its lookup could only throw
+      continue; // SetProperty would drop it; its lookup could only throw
     copy->SetProperty(key, GetProperty(key));
   }
   return copy.release();
@@ -529,8 +529,7 @@ void Style::SetPathProperty(const std::vector<PropertyKey>& path, const Style* s
     destination->ClearProperty(path.back());
 }
 
-void Style::SetProperties(const std::vector<std::vector<PropertyKey>>& paths,
-                          const Style* source) {
+void Style::SetProperties(const std::vector<std::vector<PropertyKey>>& paths, const Style* source) {
   for (const std::vector<PropertyKey>& path : paths)
     SetPathProperty(path, source);
 }
@@ -718,7 +717,8 @@ std::vector<Style*> Style::GetDependenciesImpl(StyleSpan styles, bool parentOnly
     }
     for (const PropertyMap::Entry& entry : m_properties) {
       if (const BaseStyleProperty* behaviour = FindBehaviour(entry.first)) {
-        const std::vector<Style*> held = behaviour->GetDependencies(entry.second, styles, parentOnly);
+        const std::vector<Style*> held =
+            behaviour->GetDependencies(entry.second, styles, parentOnly);
         result.insert(result.end(), held.begin(), held.end());
       }
     }
@@ -930,6 +930,5 @@ Style* Style::Deserialize(const StyleSheet& sheet, const Json::Object& object,
 } // namespace Styles
 
 namespace ZelUtils {
-template <>
-const PooledString<Styles::StringPool> PooledString<Styles::StringPool>::Empty(u"");
+template <> const PooledString<Styles::StringPool> PooledString<Styles::StringPool>::Empty(u"");
 } // namespace ZelUtils

@@ -298,6 +298,9 @@ private:
   // The behaviour of `key` in this style's category, or null.
   BaseStyleProperty* FindBehaviour(const PropertyKey& key) const;
   void DestroyOwnValues();
+  // DestroyOwnValues, then the source's parent, category and strings.
+  void DestroyValuesAndTakeLinks(const Style& source);
+  void SetExternalField(ZelStringT<char16_t> Style::*field, const ZelStringT<char16_t>& text);
   // Takes over the parent's own values, then inherits from its parent.
   void MergeParent();
   // Whether this style is `style` or one of its ancestors.

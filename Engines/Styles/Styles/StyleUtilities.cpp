@@ -22,8 +22,7 @@ PropertyPath Concatenate(const PropertyKey* first, std::size_t firstCount,
   return path;
 }
 
-template <class Keys>
-std::vector<PropertyPath> OneKeyPaths(const Keys& keys) {
+template <class Keys> std::vector<PropertyPath> OneKeyPaths(const Keys& keys) {
   std::vector<PropertyPath> paths;
   paths.reserve(keys.size());
   for (const PropertyKey& key : keys)
@@ -65,7 +64,8 @@ std::vector<PropertyPath> MakePaths(const std::vector<PropertyKey>& keys) {
 }
 
 PropertyPath SplitPath(const ZelStringT<char16_t>& text) {
-  const std::vector<ZelStringT<char16_t>> pieces = ZelUtils::String::Split(text, u".", false, false);
+  const std::vector<ZelStringT<char16_t>> pieces =
+      ZelUtils::String::Split(text, u".", false, false);
   PropertyPath path;
   path.reserve(pieces.size());
   for (const ZelStringT<char16_t>& piece : pieces)
