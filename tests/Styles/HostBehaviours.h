@@ -49,8 +49,8 @@ public:
     delete value.Get<Style*>();
   }
   ZelUtils::Any MovePropertyData(Style* owner, ZelUtils::Any&& value) const override {
-    const Style* source = value.IsTypeCompatible<Style*>() ? value.Get<Style*>()
-                                                           : value.Get<const Style*>();
+    const Style* source =
+        value.IsTypeCompatible<Style*>() ? value.Get<Style*>() : value.Get<const Style*>();
     if (!source)
       return ZelUtils::Any();
     Style* copy = new Style(*source);

