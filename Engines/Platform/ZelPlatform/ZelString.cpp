@@ -10,6 +10,7 @@
 #include <cstdint>
 #include <cstdio>
 #include <limits>
+#include <type_traits>
 
 namespace ZelPlatform {
 namespace detail {
@@ -42,19 +43,18 @@ int FoldedCompare(std::u16string_view a, std::u16string_view b) {
   return Sign(result);
 }
 
-} // namespace
-
-int CompareNoCaseUtf16(std::u16string_view a, std::u16string_view b) {
-  // ASCII letters fold to ASCII and nothing else changes in ASCII, so an ASCII
-  // prefix can be decided here; any non-ASCII unit (which may fold to ASCII,
-  // like U+212A KELVIN SIGN to "k") sends the remaining suffixes to ICU.
+// Decides on the ASCII prefix of two texts, folding A-Z; at the first
+// non-ASCII unit on either side, `rest` compares the remaining suffixes. A
+// non-ASCII unit may fold to ASCII (U+212A KELVIN SIGN to "k"), so the ASCII
+// path never decides against one.
+template <class View, class Rest> int CompareFoldingAsciiPrefix(View a, View b, Rest rest) {
+  using Unit = std::make_unsigned_t<typename View::value_type>;
   const std::size_t common = a.size() < b.size() ? a.size() : b.size();
-  std::size_t i = 0;
-  for (; i < common; ++i) {
-    const char32_t ca = a[i];
-    const char32_t cb = b[i];
+  for (std::size_t i = 0; i < common; ++i) {
+    const char32_t ca = static_cast<Unit>(a[i]);
+    const char32_t cb = static_cast<Unit>(b[i]);
     if (!IsAscii(ca) || !IsAscii(cb))
-      return FoldedCompare(a.substr(i), b.substr(i));
+      return rest(a.substr(i), b.substr(i));
     const char32_t fa = FoldAscii(ca);
     const char32_t fb = FoldAscii(cb);
     if (fa != fb)
@@ -66,22 +66,16 @@ int CompareNoCaseUtf16(std::u16string_view a, std::u16string_view b) {
   return a.size() < b.size() ? -1 : 1;
 }
 
+} // namespace
+
+int CompareNoCaseUtf16(std::u16string_view a, std::u16string_view b) {
+  return CompareFoldingAsciiPrefix(a, b, FoldedCompare);
+}
+
 int CompareNoCaseUtf8(std::string_view a, std::string_view b) {
-  const std::size_t common = a.size() < b.size() ? a.size() : b.size();
-  std::size_t i = 0;
-  for (; i < common; ++i) {
-    const char32_t ca = static_cast<unsigned char>(a[i]);
-    const char32_t cb = static_cast<unsigned char>(b[i]);
-    if (!IsAscii(ca) || !IsAscii(cb))
-      return CompareNoCaseUtf16(Utf8ToUtf16(a.substr(i)), Utf8ToUtf16(b.substr(i)));
-    const char32_t fa = FoldAscii(ca);
-    const char32_t fb = FoldAscii(cb);
-    if (fa != fb)
-      return fa < fb ? -1 : 1;
-  }
-  if (a.size() == b.size())
-    return 0;
-  return a.size() < b.size() ? -1 : 1;
+  return CompareFoldingAsciiPrefix(a, b, [](std::string_view x, std::string_view y) {
+    return FoldedCompare(Utf8ToUtf16(x), Utf8ToUtf16(y));
+  });
 }
 
 std::pair<std::size_t, std::size_t> TrimBoundsUtf16(std::u16string_view text) {
@@ -170,7 +164,7 @@ std::u16string Utf8ToUtf16(std::string_view text) {
   int64_t i = 0;
   while (i < length) {
     UChar32 c;
-    U8_NEXT(bytes, i, length, c);  // skips a maximal ill-formed subpart at once
+    U8_NEXT(bytes, i, length, c); // skips a maximal ill-formed subpart at once
     if (c < 0)
       c = 0xFFFD;
     if (U_IS_BMP(c)) {
