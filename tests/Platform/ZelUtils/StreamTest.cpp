@@ -19,21 +19,17 @@ using Text = ZelStringT<char16_t>;
 class StreamTest : public ::testing::Test {
 protected:
   void SetUp() override {
-    const auto* info = ::testing::UnitTest::GetInstance()->current_test_info();
-    m_folder = std::filesystem::path(::testing::TempDir()) /
-               ("StreamTest-" + std::to_string(::getpid()) + "-" + info->name());
     std::filesystem::remove_all(m_folder);
     std::filesystem::create_directories(m_folder);
   }
   void TearDown() override { std::filesystem::remove_all(m_folder); }
-
   // The UTF-16 path of `name` inside the folder (ASCII folder names only).
   Text PathOf(const std::u16string& name) const {
     const std::string folder = m_folder.string() + "/";
     return Text(std::u16string(folder.begin(), folder.end()) + name);
   }
-
-  std::filesystem::path m_folder;
+  const std::filesystem::path m_folder =
+      std::filesystem::path(::testing::TempDir()) / ("StreamTest-" + std::to_string(::getpid()));
 };
 
 std::string ReadAll(Stream stream) {
@@ -44,50 +40,31 @@ std::string ReadAll(Stream stream) {
   return bytes;
 }
 
-TEST_F(StreamTest, UnusableStreamRefusesEverything) {
-  Stream stream;
-  char byte = 'x';
-  EXPECT_FALSE(stream);
-  EXPECT_FALSE(stream.IsReadable());
-  EXPECT_FALSE(stream.IsWritable());
-  EXPECT_EQ(stream.Read(&byte, 1), 0u);
-  EXPECT_FALSE(stream.Write(&byte, 1));
-  EXPECT_FALSE(stream.Flush());
-  EXPECT_EQ(MemoryStream::GetBytes(stream), "");
-}
-
 TEST_F(StreamTest, FileRoundTripAndTruncation) {
-  const Text path = PathOf(u"data.bin");
+  const auto openFiles = [] {
+    return std::distance(std::filesystem::directory_iterator("/proc/self/fd"),
+                         std::filesystem::directory_iterator());
+  };
+  const auto before = openFiles();
+  const Text path = PathOf(u"caf\u00e9-\U0001F600.bin");
   const std::string bytes("one\0two\xFF", 8);
   {
     Stream stream = FileStream::Create(path);
-    ASSERT_TRUE(stream);
-    EXPECT_TRUE(stream.IsWritable());
-    EXPECT_FALSE(stream.IsReadable());
+    ASSERT_TRUE(stream && stream.IsWritable() && !stream.IsReadable());
     Stream copy = stream; // both handles write to one file, one after the other
     EXPECT_TRUE(stream.Write(bytes.data(), 4));
+    stream = Stream(); // the last handle closes the file
+    EXPECT_EQ(openFiles(), before + 1);
     EXPECT_TRUE(copy.Write(bytes.data() + 4, 4));
-    EXPECT_TRUE(copy.Flush());
-    char byte;
-    EXPECT_EQ(stream.Read(&byte, 1), 0u);
   }
+  EXPECT_EQ(openFiles(), before);
+  // Non-ASCII paths are UTF-8 on disk.
+  EXPECT_TRUE(std::filesystem::exists(m_folder / "caf\xC3\xA9-\xF0\x9F\x98\x80.bin"));
   Stream reader = FileStream::Open(path);
-  ASSERT_TRUE(reader);
   EXPECT_FALSE(reader.Write("x", 1));
   EXPECT_EQ(ReadAll(reader), bytes);
-
   ASSERT_TRUE(FileStream::Create(path)); // creating again empties the file
   EXPECT_EQ(ReadAll(FileStream::Open(path)), "");
-}
-
-TEST_F(StreamTest, NonAsciiPathsAreUtf8OnDisk) {
-  const Text path = PathOf(u"caf\u00e9-\U0001F600.txt");
-  Stream stream = FileStream::Create(path);
-  ASSERT_TRUE(stream);
-  EXPECT_TRUE(stream.Write("hi", 2));
-  stream = Stream(); // closes the file
-  EXPECT_TRUE(std::filesystem::exists(m_folder / "caf\xC3\xA9-\xF0\x9F\x98\x80.txt"));
-  EXPECT_EQ(ReadAll(FileStream::Open(path)), "hi");
 }
 
 TEST_F(StreamTest, BadPathsGiveUnusableStreams) {
@@ -110,22 +87,12 @@ TEST_F(StreamTest, BadPathsGiveUnusableStreams) {
   }
   EXPECT_FALSE(FileStream::Open(PathOf(u"never-written.txt")));
   EXPECT_FALSE(std::filesystem::exists(m_folder / "a")); // not truncated at the NUL
-}
 
-TEST_F(StreamTest, LastHandleClosesTheFile) {
-  const auto openFiles = [] {
-    return std::distance(std::filesystem::directory_iterator("/proc/self/fd"),
-                         std::filesystem::directory_iterator());
-  };
-  const auto before = openFiles();
-  {
-    Stream stream = FileStream::Create(PathOf(u"closing.txt"));
-    Stream copy = stream;
-    stream = Stream();
-    EXPECT_EQ(openFiles(), before + 1);
-    EXPECT_TRUE(copy.Write("x", 1));
-  }
-  EXPECT_EQ(openFiles(), before);
+  Stream unusable;
+  char byte = 'x';
+  EXPECT_EQ(unusable.Read(&byte, 1), 0u);
+  EXPECT_FALSE(unusable.Write(&byte, 1) || unusable.Flush());
+  EXPECT_EQ(MemoryStream::GetBytes(unusable), "");
 }
 
 TEST_F(StreamTest, MemoryStreamsShareBytesAndPosition) {
@@ -135,15 +102,9 @@ TEST_F(StreamTest, MemoryStreamsShareBytesAndPosition) {
   EXPECT_EQ(stream.Read(buffer, 2), 2u);
   EXPECT_EQ(copy.Read(buffer, 4), 4u); // continues where the other handle stopped
   EXPECT_EQ(std::string(buffer, 4), "cdef");
-  EXPECT_EQ(stream.Read(buffer, 4), 0u);
   EXPECT_TRUE(stream.Write("gh", 2));
   EXPECT_EQ(MemoryStream::GetBytes(copy), "abcdefgh");
   EXPECT_EQ(ReadAll(copy), "gh");
-
-  Stream empty = MemoryStream::Create();
-  EXPECT_TRUE(empty.IsReadable() && empty.IsWritable());
-  EXPECT_EQ(MemoryStream::GetBytes(empty), "");
-  EXPECT_TRUE(empty.Write(nullptr, 0));
 }
 
 } // namespace

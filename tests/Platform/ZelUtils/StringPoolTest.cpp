@@ -23,54 +23,29 @@ std::u16string Numbered(const char* prefix, int number) {
   return std::u16string(text.begin(), text.end());
 }
 
-TEST(StringPoolTest, EqualTextsShareOneEntry) {
-  StringPool pool;
-  const StringPool::Entry* first = pool.AddString(u"width");
-  EXPECT_EQ(pool.AddString(std::u16string(u"width")), first);
-  EXPECT_NE(pool.AddString(u"Width"), first);
-  EXPECT_EQ(pool.AddString(u""), pool.GetEmptyEntry());
-  EXPECT_TRUE(*first == u"width");
-  EXPECT_EQ(pool.GetSize(), 3u); // "", "width", "Width"
-}
-
 TEST(StringPoolTest, KeysCompareAndHashByEntry) {
   const Key a(u"alpha");
   const Key b(ZelStringT<char16_t>(u"beta"));
-  EXPECT_EQ(Key(u""), Key());
-  EXPECT_EQ(Key(static_cast<const char16_t*>(nullptr)), Key());
+  EXPECT_EQ(Key(static_cast<const char16_t*>(nullptr)), Key(u""));
   EXPECT_EQ(a, Key(u"alpha"));
   EXPECT_NE(a, Key(u"Alpha"));
-  EXPECT_TRUE(a.ToString() == u"alpha");
   EXPECT_EQ(std::hash<Key>()(a), std::hash<const void*>()(&a.GetString()));
   // Order follows the entries' addresses, not the texts.
   EXPECT_EQ(a < b, std::less<const void*>()(&a.GetString(), &b.GetString()));
-  EXPECT_NE(a < b, b < a);
 }
 
-TEST(StringPoolTest, EntriesNeverMove) {
+// Entries never move, and threads interning the same texts in racing orders
+// agree on one entry per text.
+TEST(StringPoolTest, EntriesAreStableAcrossThreadsAndGrowth) {
   StringPool pool;
-  std::vector<const StringPool::Entry*> early;
-  for (int i = 0; i < 8; ++i)
-    early.push_back(pool.AddString(Numbered("k", i))); // short texts live inside the entry
-  for (int i = 0; i < 100000; ++i)
-    pool.AddString(Numbered("filler-", i));
-  for (int i = 0; i < 8; ++i) {
-    SCOPED_TRACE(i);
-    EXPECT_TRUE(*early[i] == Numbered("k", i).c_str());
-    EXPECT_EQ(pool.AddString(Numbered("k", i)), early[i]);
-  }
-}
-
-TEST(StringPoolTest, ConcurrentInterningAgrees) {
-  StringPool pool;
+  const StringPool::Entry* early = pool.AddString(u"k"); // short texts live inside the entry
   constexpr int kThreads = 4;
-  constexpr int kTexts = 2000;
+  constexpr int kTexts = 20000;
   std::vector<std::vector<const StringPool::Entry*>> results(
       kThreads, std::vector<const StringPool::Entry*>(kTexts));
   std::vector<std::thread> threads;
   for (int t = 0; t < kThreads; ++t) {
     threads.emplace_back([&pool, &results, t] {
-      // Each thread walks the texts in its own order so that insertions race.
       for (int n = 0; n < kTexts; ++n) {
         const int i = t % 2 == 0 ? n : kTexts - 1 - n;
         results[t][i] = pool.AddString(Numbered("shared-", i));
@@ -84,7 +59,9 @@ TEST(StringPoolTest, ConcurrentInterningAgrees) {
       ASSERT_EQ(results[t][i], results[0][i]) << "text " << i << " thread " << t;
     ASSERT_TRUE(*results[0][i] == Numbered("shared-", i).c_str());
   }
-  EXPECT_EQ(pool.GetSize(), kTexts + 1u);
+  EXPECT_EQ(pool.GetSize(), kTexts + 2u); // with "" and "k"
+  EXPECT_TRUE(*early == u"k");
+  EXPECT_EQ(pool.AddString(std::u16string(u"k")), early);
 }
 
 } // namespace
