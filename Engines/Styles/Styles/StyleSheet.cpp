@@ -6,11 +6,12 @@
 #include <Json/Json.h>
 #include <ZelUtils/TextStream.h>
 
+#include <algorithm>
 #include <cassert>
 #include <climits>
 #include <cmath>
+#include <iterator>
 #include <memory>
-#include <unordered_set>
 #include <utility>
 
 namespace Styles {
@@ -21,9 +22,8 @@ namespace {
 constexpr char16_t k_strVersion[] = u"version";
 constexpr char16_t k_strExternalID[] = u"id";
 
-// The byte encoding of documents in streams (UTF-8), the same both ways.
-constexpr ZelUtils::TextStream::Encoding kDocumentEncoding =
-    static_cast<ZelUtils::TextStream::Encoding>(3);
+// The byte encoding of documents in streams, the same both ways.
+constexpr ZelUtils::TextStream::Encoding kDocumentEncoding = ZelUtils::TextStream::UTF8;
 
 bool NameEquals(const ZelStringT<char16_t>& name, const char16_t* fixed) {
   return name.Compare(fixed, 0) == 0;
@@ -66,21 +66,58 @@ void StyleSheet::Clear() {
 }
 
 Style* StyleSheet::AddStyle(const ZelStringT<char16_t>& name, Style* style, bool replace) {
-  Style* previous = replace ? RemoveStyle(name) : nullptr;
+  Style* previous = nullptr;
+  FileStyle(name, style, replace, previous);
+  return previous;
+}
+
+StyleSheet::NameIndex::iterator StyleSheet::FileStyle(const ZelStringT<char16_t>& name,
+                                                      Style* style, bool replace,
+                                                      Style*& previous) {
+  previous = nullptr;
   const auto found = m_styles->lower_bound(name);
-  if (found != m_styles->end() && !m_styles->key_comp()(name, found->first)) {
-    // Only possible without `replace`: the style already in the sheet wins.
+  const bool present = found != m_styles->end() && !m_styles->key_comp()(name, found->first);
+  if (present && !replace) {
+    // The style already in the sheet wins.
     delete style;
-    return previous;
+    return found;
   }
-  const auto inserted = m_styles->emplace_hint(found, name, style);
+  Style* const removed = present ? found->second : nullptr;
+  NameIndex::iterator filed;
   try {
-    (*m_names)[style] = name;
+    // Everything that allocates comes before the first change, so that a
+    // failure leaves both indexes as they were.
+    ZelStringT<char16_t> key = name;
+    ZelStringT<char16_t> spelling = name;
+    const auto [pointerEntry, newPointerEntry] = m_names->try_emplace(style);
+    if (present) {
+      // Replacing: the entry is taken out and put back under the caller's
+      // spelling, which is what removing and adding again amounts to.
+      const auto next = std::next(found);
+      auto node = m_styles->extract(found);
+      node.key() = std::move(key);
+      node.mapped() = style;
+      filed = m_styles->insert(next, std::move(node));
+      if (removed != style)
+        m_names->erase(removed);
+    } else {
+      try {
+        filed = m_styles->emplace_hint(found, std::move(key), style);
+      } catch (...) {
+        if (newPointerEntry)
+          m_names->erase(pointerEntry);
+        throw;
+      }
+    }
+    pointerEntry->second = std::move(spelling);
   } catch (...) {
-    m_styles->erase(inserted);
+    // The sheet owns the offered style even when it could not be filed.
+    if (style != removed)
+      delete style;
     throw;
   }
-  return previous;
+  previous = removed;
+  return filed;
 }
 
 Style* StyleSheet::RemoveStyle(const ZelStringT<char16_t>& name) {
@@ -93,14 +130,23 @@ Style* StyleSheet::RemoveStyle(const ZelStringT<char16_t>& name) {
   return style;
 }
 
+Style* StyleSheet::DetachByPointerEntry(PointerIndex::iterator entry) {
+  const auto found = m_styles->find(entry->second);
+  if (found == m_styles->end())
+    return nullptr;
+  Style* style = found->second;
+  m_styles->erase(found);
+  m_names->erase(style);
+  return style;
+}
+
 bool StyleSheet::RemoveStyle(Style* style) {
   if (!style)
     return false;
   const auto found = m_names->find(style);
   if (found == m_names->end())
     return false;
-  const ZelStringT<char16_t> name = found->second;
-  RemoveStyle(name);
+  DetachByPointerEntry(found);
   return true;
 }
 
@@ -116,8 +162,7 @@ void StyleSheet::DeleteStyles(StyleSpan styles) {
     const auto found = m_names->find(style);
     if (found == m_names->end())
       continue; // foreign styles are left to their owner
-    const ZelStringT<char16_t> name = found->second;
-    delete RemoveStyle(name);
+    delete DetachByPointerEntry(found);
   }
 }
 
@@ -128,15 +173,14 @@ void StyleSheet::RenameStyle(const ZelStringT<char16_t>& oldName,
   const auto found = m_styles->find(oldName);
   if (found == m_styles->end())
     return;
-  // Copies first, so that a failed allocation leaves both indexes as they were.
+  // Allocations first, so that a failure leaves both indexes as they were.
   ZelStringT<char16_t> nameKey = newName;
   ZelStringT<char16_t> nameValue = newName;
-  const auto pointerEntry = m_names->find(found->second);
+  const auto pointerEntry = m_names->try_emplace(found->second).first;
   auto node = m_styles->extract(found);
   node.key() = std::move(nameKey);
   m_styles->insert(std::move(node));
-  if (pointerEntry != m_names->end())
-    pointerEntry->second = std::move(nameValue);
+  pointerEntry->second = std::move(nameValue);
 }
 
 void StyleSheet::MergeIn(StyleSheet& other, bool replace) {
@@ -271,21 +315,23 @@ void StyleSheet::CopyContentsFrom(const StyleSheet& source,
 
 void StyleSheet::ExportJson(JsonValue& out, bool includeTemporary) const {
   Json::Object& document = out.Get<Json::Object>();
-  CategoryStyleMap categories;
-  GenerateCategoryStyleMap(categories);
+  // The grouping of GenerateCategoryStyleMap, pointing into the name index
+  // instead of copying every name into a second map.
+  std::map<PropertyKey, std::vector<const NameIndex::value_type*>> categories;
+  for (const auto& entry : *m_styles)
+    if (entry.second)
+      categories[entry.second->GetCategoryName()].push_back(&entry);
   if (m_version > 0)
     document.AddValue(k_strVersion, Json::Value(m_version));
   if (!m_externalID.IsEmpty())
     document.AddValue(k_strExternalID, Json::Value(m_externalID));
   for (const auto& category : categories) {
-    if (category.second.empty())
-      continue;
     Json::Object styles;
     styles.Reserve(category.second.size());
-    for (const auto& entry : category.second) {
+    for (const NameIndex::value_type* entry : category.second) {
       Json::Value style;
-      entry.second->Serialize(*this, style, includeTemporary);
-      styles.AddValue(entry.first, std::move(style));
+      entry->second->Serialize(*this, style, includeTemporary);
+      styles.AddValue(entry->first, std::move(style));
     }
     document.AddValue(category.first.GetString(), Json::Value(std::move(styles)));
   }
@@ -296,62 +342,66 @@ bool StyleSheet::ImportJson(Json::Object* document, bool replace) {
   if (!document)
     return false;
   StyleManager& manager = GetStyleManager();
-  // Styles made by this import; only they are read in the second pass, so
-  // styles that were in the sheet before are never read into.
-  std::unordered_set<const Style*> created;
+  // Styles made by this import, sorted after the first pass; only they are
+  // read, so styles that were in the sheet before are never read into.
+  std::vector<const Style*> created;
+  // The name-index entry filed under each style member's name, in document
+  // order. Import never erases an entry (a replacement re-files it), so the
+  // second pass reads each entry instead of searching for the name again.
+  std::vector<const NameIndex::value_type*> filed;
   bool versionSeen = false;
 
-  // First pass: an empty style for every name, plus the version and the ID,
-  // so that every reference can be resolved when the styles are read.
+  // The members are gone through twice. The first pass makes an empty style
+  // for every name, so that every reference resolves when the second pass
+  // reads the styles; the version and the ID are applied in both.
   const std::size_t memberCount = document->GetSize();
-  for (std::size_t i = 0; i < memberCount; ++i) {
-    const ZelStringT<char16_t>& name = document->GetValueName(i);
-    const Json::Value& value = document->GetValue(i);
-    if (const Json::Object* category = value.GetIf<Json::Object>()) {
-      if (!manager.CategoryExists(name))
-        continue;
-      for (std::size_t j = 0; j < category->GetSize(); ++j) {
-        category->GetValue(j).Get<Json::Object>(); // std::bad_cast for a non-object
-        const ZelStringT<char16_t>& styleName = category->GetValueName(j);
-        std::unique_ptr<Style> style(new Style);
-        created.insert(style.get());
-        Style* added = style.release();
-        Style* previous = AddStyle(styleName, added, replace);
-        if (m_names->find(added) == m_names->end())
-          created.erase(added); // lost the clash and was destroyed
-        if (previous) {
-          created.erase(previous);
-          delete previous;
+  for (int pass = 0; pass < 2; ++pass) {
+    std::size_t next = 0;
+    for (std::size_t i = 0; i < memberCount; ++i) {
+      const ZelStringT<char16_t>& name = document->GetValueName(i);
+      const Json::Value& value = document->GetValue(i);
+      if (const Json::Object* category = value.GetIf<Json::Object>()) {
+        if (!manager.CategoryExists(name))
+          continue;
+        const std::size_t styleCount = category->GetSize();
+        if (pass == 0) {
+          for (std::size_t j = 0; j < styleCount; ++j) {
+            category->GetValue(j).Get<Json::Object>(); // std::bad_cast for a non-object
+            std::unique_ptr<Style> style(new Style);
+            created.push_back(style.get());
+            Style* previous = nullptr;
+            const auto entry =
+                FileStyle(category->GetValueName(j), style.release(), replace, previous);
+            delete previous;
+            filed.push_back(&*entry);
+          }
+          continue;
         }
+        const PropertyKey categoryKey(name);
+        for (std::size_t j = 0; j < styleCount; ++j) {
+          Style* style = filed[next++]->second;
+          if (!std::binary_search(created.begin(), created.end(), style))
+            continue;
+          style->SetCategory(categoryKey);
+          style->DeserializeJson(*this, category->GetValue(j).Get<Json::Object>());
+          if (!m_externalID.IsEmpty())
+            style->SetExternalID(m_externalID);
+        }
+      } else if (const double* number = value.GetIf<double>()) {
+        if (NameEquals(name, k_strVersion)) {
+          m_version = TruncateVersion(*number);
+          versionSeen = true;
+        }
+      } else if (const ZelStringT<char16_t>* text = value.GetIf<ZelStringT<char16_t>>()) {
+        // The document's ID is taken only by a sheet that already has one.
+        if (NameEquals(name, k_strExternalID) && !m_externalID.IsEmpty())
+          m_externalID = *text;
       }
-    } else if (const double* number = value.GetIf<double>()) {
-      if (NameEquals(name, k_strVersion)) {
-        m_version = TruncateVersion(*number);
-        versionSeen = true;
-      }
-    } else if (const ZelStringT<char16_t>* text = value.GetIf<ZelStringT<char16_t>>()) {
-      // The document's ID is taken only by a sheet that already has one.
-      if (NameEquals(name, k_strExternalID) && !m_externalID.IsEmpty())
-        m_externalID = *text;
     }
-  }
-
-  // Second pass: read the new styles.
-  for (std::size_t i = 0; i < memberCount; ++i) {
-    const ZelStringT<char16_t>& name = document->GetValueName(i);
-    const Json::Object* category = document->GetValue(i).GetIf<Json::Object>();
-    if (!category || !manager.CategoryExists(name))
-      continue;
-    const PropertyKey categoryKey(name);
-    for (std::size_t j = 0; j < category->GetSize(); ++j) {
-      Style* style = GetStyle(category->GetValueName(j));
-      if (!style || created.count(style) == 0)
-        continue;
-      style->SetCategory(categoryKey);
-      style->DeserializeJson(*this, category->GetValue(j).Get<Json::Object>());
-      if (!m_externalID.IsEmpty())
-        style->SetExternalID(m_externalID);
-    }
+    // An address freed in the first pass can only have been reused by a
+    // style made later in it, so membership in `created` stays exact.
+    if (pass == 0)
+      std::sort(created.begin(), created.end());
   }
 
   if (!versionSeen)

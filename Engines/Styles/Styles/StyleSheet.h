@@ -20,10 +20,11 @@ namespace Styles {
 // Told about every style that StyleSheet::CopyContentsFrom creates.
 class STYLES_API IStyleSheetDuplicationContext {
 public:
-  virtual ~IStyleSheetDuplicationContext();
   // Called once per style of the copy, in name order; `style` belongs to the
   // sheet. The sheet always passes 0 as `reserved` and ignores the result.
+  // Declared first: hosts rely on it being the first virtual slot.
   virtual bool OnStyleDuplicated(Style* style, int reserved) = 0;
+  virtual ~IStyleSheetDuplicationContext();
 };
 
 class STYLES_API StyleSheet {
@@ -94,7 +95,9 @@ public:
   // Offers each of this sheet's own styles back to this sheet's AddStyle
   // under its own name and destroys what AddStyle returns, then forgets the
   // names of `other`'s styles (they are neither moved nor destroyed). Kept as
-  // it always behaved: after the call, this sheet's styles must not be used.
+  // it always behaved, which hosts must know: afterwards this sheet still
+  // lists its destroyed styles, so detach them (RemoveStyle) before clearing
+  // or destroying the sheet, and `other`'s styles are the caller's to delete.
   void MergeIn(StyleSheet& other, bool replace);
 
   // Queries; styles returned stay owned by the sheet.
@@ -141,6 +144,14 @@ public:
   bool Import(ZelUtils::Stream& stream, bool replace);
 
 private:
+  // AddStyle with one search of the name index; `previous` receives what
+  // AddStyle returns. Returns the entry now filed under `name`.
+  NameIndex::iterator FileStyle(const ZelStringT<char16_t>& name, Style* style, bool replace,
+                                Style*& previous);
+  // Detaches the style filed under the name that `entry` records; null when
+  // the name index lacks that name.
+  Style* DetachByPointerEntry(PointerIndex::iterator entry);
+
   std::unique_ptr<NameIndex> m_styles;
   std::unique_ptr<PointerIndex> m_names;
   int m_version;
