@@ -194,7 +194,14 @@ public:
   }
   // The held value, or null when the held kind is not exactly T.
   template <class T> T* GetIf() noexcept {
-    return m_ops && detail::SameKind(*m_ops->type, typeid(T)) ? static_cast<T*>(Object()) : nullptr;
+    if (!m_ops || !detail::SameKind(*m_ops->type, typeid(T)))
+      return nullptr;
+    // Where T lives is known from T itself, the same rule in every library.
+    void* storage = m_storage;
+    if constexpr (kInline<T>)
+      return static_cast<T*>(storage);
+    else
+      return *static_cast<T**>(storage);
   }
   template <class T> const T* GetIf() const noexcept { return const_cast<Any*>(this)->GetIf<T>(); }
 
