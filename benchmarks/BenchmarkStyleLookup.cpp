@@ -68,71 +68,70 @@ struct Chains {
   std::vector<Style*> leaves;
 };
 
-void BM_GetPropertyOwnHit(benchmark::State& state) {
-  Chains chains(int(state.range(0)), 0);
+// Times `lookup` over the leaves in turn.
+template <class Leaf, class Lookup>
+void RunLookups(benchmark::State& state, const std::vector<Leaf>& leaves, Lookup lookup) {
   std::size_t i = 0;
   for (auto _ : state) {
-    const Any& value = chains.leaves[i]->GetProperty(chains.target);
-    benchmark::DoNotOptimize(&value);
-    i = (i + 1) % chains.leaves.size();
+    benchmark::DoNotOptimize(lookup(leaves[i]));
+    i = (i + 1) % leaves.size();
   }
   state.SetItemsProcessed(state.iterations());
+}
+
+void BM_GetPropertyOwnHit(benchmark::State& state) {
+  const Chains chains(int(state.range(0)), 0);
+  RunLookups(state, chains.leaves,
+             [&](const Style* leaf) { return &leaf->GetProperty(chains.target); });
 }
 BENCHMARK(BM_GetPropertyOwnHit)->Arg(8192);
 
 void BM_GetPropertyParentMiss(benchmark::State& state) {
   const int depth = int(state.range(0));
-  Chains chains(65536 / (depth + 1), depth);
-  std::size_t i = 0;
-  for (auto _ : state) {
-    const Any& value = chains.leaves[i]->GetProperty(chains.target);
-    benchmark::DoNotOptimize(&value);
-    i = (i + 1) % chains.leaves.size();
-  }
-  state.SetItemsProcessed(state.iterations());
+  const Chains chains(65536 / (depth + 1), depth);
+  RunLookups(state, chains.leaves,
+             [&](const Style* leaf) { return &leaf->GetProperty(chains.target); });
   state.SetLabel("depth " + std::to_string(depth));
 }
 BENCHMARK(BM_GetPropertyParentMiss)->Arg(1)->Arg(4)->Arg(16);
 
-// The same walk over node-based maps, for comparison.
+// The same walk over node-based maps holding the same values, for comparison.
 struct NodeStyle {
   std::map<PropertyKey, Any> values;
   const NodeStyle* parent = nullptr;
 };
 
+// A node for `style` and its ancestors, filed in `nodes`.
+const NodeStyle* Mirror(const Style* style, std::vector<std::unique_ptr<NodeStyle>>& nodes) {
+  if (!style)
+    return nullptr;
+  const NodeStyle* parent = Mirror(style->GetParent(), nodes);
+  nodes.emplace_back(new NodeStyle);
+  nodes.back()->parent = parent;
+  for (const Styles::PropertyMap::Entry& entry : style->GetProperties())
+    nodes.back()->values.emplace(entry.first, entry.second);
+  return nodes.back().get();
+}
+
 void BM_NodeMapParentMiss(benchmark::State& state) {
   const int depth = int(state.range(0));
-  const std::vector<PropertyKey>& keys = Keys();
-  const int chainCount = 65536 / (depth + 1);
-  std::vector<std::unique_ptr<NodeStyle>> styles;
+  std::vector<std::unique_ptr<NodeStyle>> nodes;
   std::vector<const NodeStyle*> leaves;
-  for (int c = 0; c < chainCount; ++c) {
-    const NodeStyle* parent = nullptr;
-    for (int level = 0; level <= depth; ++level) {
-      styles.emplace_back(new NodeStyle);
-      NodeStyle* style = styles.back().get();
-      style->parent = parent;
-      if (level == 0)
-        style->values.emplace(keys[0], Any(double(c)));
-      for (int k = 1; k <= kOwnValuesPerStyle - (level == 0 ? 1 : 0); ++k)
-        style->values.emplace(keys[std::size_t(k)], Any(double(k)));
-      parent = style;
-    }
-    leaves.push_back(parent);
+  PropertyKey target;
+  {
+    const Chains chains(65536 / (depth + 1), depth);
+    target = chains.target;
+    for (const Style* leaf : chains.leaves)
+      leaves.push_back(Mirror(leaf, nodes));
   }
-  std::shuffle(leaves.begin(), leaves.end(), std::mt19937(42));
-  std::size_t i = 0;
-  for (auto _ : state) {
-    const Any* found = nullptr;
-    for (const NodeStyle* style = leaves[i]; style && !found; style = style->parent) {
-      const auto entry = style->values.find(keys[0]);
-      if (entry != style->values.end())
-        found = &entry->second;
+  RunLookups(state, leaves, [&](const NodeStyle* leaf) {
+    for (const NodeStyle* node = leaf; node; node = node->parent) {
+      const auto entry = node->values.find(target);
+      if (entry != node->values.end())
+        return &entry->second;
     }
-    benchmark::DoNotOptimize(found);
-    i = (i + 1) % leaves.size();
-  }
-  state.SetItemsProcessed(state.iterations());
+    return static_cast<const Any*>(nullptr);
+  });
   state.SetLabel("depth " + std::to_string(depth));
 }
 BENCHMARK(BM_NodeMapParentMiss)->Arg(1)->Arg(4)->Arg(16);

@@ -315,12 +315,8 @@ void StyleSheet::CopyContentsFrom(const StyleSheet& source,
 
 void StyleSheet::ExportJson(JsonValue& out, bool includeTemporary) const {
   Json::Object& document = out.Get<Json::Object>();
-  // The grouping of GenerateCategoryStyleMap, pointing into the name index
-  // instead of copying every name into a second map.
-  std::map<PropertyKey, std::vector<const NameIndex::value_type*>> categories;
-  for (const auto& entry : *m_styles)
-    if (entry.second)
-      categories[entry.second->GetCategoryName()].push_back(&entry);
+  CategoryStyleMap categories;
+  GenerateCategoryStyleMap(categories);
   if (m_version > 0)
     document.AddValue(k_strVersion, Json::Value(m_version));
   if (!m_externalID.IsEmpty())
@@ -328,10 +324,10 @@ void StyleSheet::ExportJson(JsonValue& out, bool includeTemporary) const {
   for (const auto& category : categories) {
     Json::Object styles;
     styles.Reserve(category.second.size());
-    for (const NameIndex::value_type* entry : category.second) {
-      Json::Value style;
-      entry->second->Serialize(*this, style, includeTemporary);
-      styles.AddValue(entry->first, std::move(style));
+    for (const auto& [name, style] : category.second) {
+      Json::Value json;
+      style->Serialize(*this, json, includeTemporary);
+      styles.AddValue(name, std::move(json));
     }
     document.AddValue(category.first.GetString(), Json::Value(std::move(styles)));
   }
