@@ -306,7 +306,6 @@ private:
   // Whether this style is `style` or one of its ancestors.
   bool IsAncestorOrSelf(const Style* style) const noexcept;
   const ZelUtils::Any& DefaultValue(const PropertyKey& key) const;
-  const ZelUtils::Any* FindOwnerBasedParentValue(const Style*& cur, const PropertyKey& key) const;
 
   PropertyMap m_properties;
   Style* m_parent = nullptr;
