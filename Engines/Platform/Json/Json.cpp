@@ -35,44 +35,9 @@ using Utf16 = rapidjson::UTF16<char16_t>;
 using rapidjson::SizeType;
 
 constexpr char16_t kByteOrderMark = 0xFEFF;
-constexpr char16_t kReplacementCharacter = 0xFFFD;
 
-bool IsHighSurrogate(char16_t c) { return c >= 0xD800 && c <= 0xDBFF; }
-bool IsLowSurrogate(char16_t c) { return c >= 0xDC00 && c <= 0xDFFF; }
-
-// True when text holds a high surrogate not followed by a low one, or a low
-// surrogate not preceded by a high one.
-bool HasUnpairedSurrogate(const char16_t* text, std::size_t length) {
-  // Most text has no surrogate at all; this loop has no early exit so that
-  // the compiler can vectorise it.
-  bool anySurrogate = false;
-  for (std::size_t i = 0; i < length; ++i)
-    anySurrogate |= (text[i] & 0xF800) == 0xD800;
-  if (!anySurrogate)
-    return false;
-  for (std::size_t i = 0; i < length; ++i) {
-    const char16_t c = text[i];
-    if ((c & 0xF800) != 0xD800)
-      continue;
-    if (!IsHighSurrogate(c) || i + 1 == length || !IsLowSurrogate(text[i + 1]))
-      return true;
-    ++i;
-  }
-  return false;
-}
-
-void ReplaceUnpairedSurrogates(std::u16string_view text, std::u16string& out) {
-  out.assign(text.begin(), text.end());
-  for (std::size_t i = 0; i < out.size(); ++i) {
-    if ((out[i] & 0xF800) != 0xD800)
-      continue;
-    if (IsHighSurrogate(out[i]) && i + 1 < out.size() && IsLowSurrogate(out[i + 1]))
-      ++i;
-    else
-      out[i] = kReplacementCharacter;
-  }
-}
-
+using ZelPlatform::detail::HasUnpairedSurrogate;
+using ZelPlatform::detail::ReplaceUnpairedSurrogates;
 
 // The decimal exponent of the first non-zero digit of a JSON number, with
 // the exponent part clamped so that it cannot overflow; 0 when all digits are 0.
@@ -160,13 +125,13 @@ public:
     return Number(number);
   }
   bool String(const Ch* text, SizeType length, bool) {
-    if (HasUnpairedSurrogate(text, length))
+    if (HasUnpairedSurrogate(std::u16string_view(text, length)))
       return Fail("Unpaired surrogate in string");
     NextSlot().Emplace<ZelStringT<char16_t>>(text, length);
     return true;
   }
   bool Key(const Ch* text, SizeType length, bool) {
-    if (HasUnpairedSurrogate(text, length))
+    if (HasUnpairedSurrogate(std::u16string_view(text, length)))
       return Fail("Unpaired surrogate in member name");
     m_members.emplace_back();
     m_members.back().name.GetStdString().assign(text, length);
@@ -306,7 +271,7 @@ private:
     if (text.size() > std::numeric_limits<SizeType>::max())
       return false;
     const char16_t* data = text.data();
-    if (HasUnpairedSurrogate(data, text.size())) {
+    if (HasUnpairedSurrogate(text)) {
       ReplaceUnpairedSurrogates(text, m_scratch);
       data = m_scratch.data();
     }

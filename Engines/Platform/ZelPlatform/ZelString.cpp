@@ -26,8 +26,22 @@ inline char32_t FoldAscii(char32_t c) noexcept {
 
 inline int Sign(int value) noexcept { return value < 0 ? -1 : (value > 0 ? 1 : 0); }
 
+inline bool IsHighSurrogate(char16_t c) noexcept { return c >= 0xD800 && c <= 0xDBFF; }
+inline bool IsLowSurrogate(char16_t c) noexcept { return c >= 0xDC00 && c <= 0xDFFF; }
+
 // Full case-folded comparison of two UTF-16 texts in code point order.
 int FoldedCompare(std::u16string_view a, std::u16string_view b) {
+  // ICU compares an unpaired surrogate as its own code point; it must compare
+  // as the U+FFFD it is written as.
+  std::u16string repairedA, repairedB;
+  if (HasUnpairedSurrogate(a)) {
+    ReplaceUnpairedSurrogates(a, repairedA);
+    a = repairedA;
+  }
+  if (HasUnpairedSurrogate(b)) {
+    ReplaceUnpairedSurrogates(b, repairedB);
+    b = repairedB;
+  }
   // ICU takes 32-bit lengths; texts beyond 2 GiB code units are not supported.
   assert(a.size() <= static_cast<std::size_t>(std::numeric_limits<int32_t>::max()));
   assert(b.size() <= static_cast<std::size_t>(std::numeric_limits<int32_t>::max()));
@@ -67,6 +81,37 @@ template <class View, class Rest> int CompareFoldingAsciiPrefix(View a, View b, 
 }
 
 } // namespace
+
+bool HasUnpairedSurrogate(std::u16string_view text) noexcept {
+  // Most text has no surrogate at all; this loop has no early exit so that
+  // the compiler can vectorise it.
+  bool anySurrogate = false;
+  for (const char16_t c : text)
+    anySurrogate |= (c & 0xF800) == 0xD800;
+  if (!anySurrogate)
+    return false;
+  for (std::size_t i = 0; i < text.size(); ++i) {
+    const char16_t c = text[i];
+    if ((c & 0xF800) != 0xD800)
+      continue;
+    if (!IsHighSurrogate(c) || i + 1 == text.size() || !IsLowSurrogate(text[i + 1]))
+      return true;
+    ++i;
+  }
+  return false;
+}
+
+void ReplaceUnpairedSurrogates(std::u16string_view text, std::u16string& out) {
+  out.assign(text.begin(), text.end());
+  for (std::size_t i = 0; i < out.size(); ++i) {
+    if ((out[i] & 0xF800) != 0xD800)
+      continue;
+    if (IsHighSurrogate(out[i]) && i + 1 < out.size() && IsLowSurrogate(out[i + 1]))
+      ++i;
+    else
+      out[i] = static_cast<char16_t>(kReplacementCharacter);
+  }
+}
 
 int CompareNoCaseUtf16(std::u16string_view a, std::u16string_view b) {
   return CompareFoldingAsciiPrefix(a, b, FoldedCompare);

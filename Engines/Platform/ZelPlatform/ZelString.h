@@ -21,7 +21,9 @@ ZEL_API std::u16string Utf8ToUtf16(std::string_view text);
 ZEL_API std::string Utf16ToUtf8(std::u16string_view text);
 
 namespace detail {
-// Full Unicode case-folded comparison (ASCII fast path); <0, 0 or >0.
+// Full Unicode case-folded comparison (ASCII fast path); <0, 0 or >0. An
+// unpaired surrogate compares as U+FFFD, the character that JSON text and
+// UTF-8 write in its place, so texts equal here stay equal once written.
 ZEL_API int CompareNoCaseUtf16(std::u16string_view a, std::u16string_view b);
 ZEL_API int CompareNoCaseUtf8(std::string_view a, std::string_view b);
 // Bounds [first, last) of the text without leading and trailing white space.
@@ -31,6 +33,11 @@ ZEL_API std::pair<std::size_t, std::size_t> TrimBoundsUtf8(std::string_view text
 // printf format attribute: FormatInternal always forwards a non-literal format,
 // which would trip -Wformat-security in hosts for calls without arguments.
 ZEL_API std::string FormatAscii(const char* format, ...);
+// Whether `text` holds a high surrogate not followed by a low one, or a low
+// surrogate not preceded by a high one.
+bool HasUnpairedSurrogate(std::u16string_view text) noexcept;
+// `out` becomes `text` with every unpaired surrogate replaced by U+FFFD.
+void ReplaceUnpairedSurrogates(std::u16string_view text, std::u16string& out);
 } // namespace detail
 } // namespace ZelPlatform
 

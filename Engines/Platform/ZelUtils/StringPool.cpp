@@ -27,6 +27,12 @@ const StringPool::Entry* StringPool::AddString(std::u16string_view text) {
   return &entry;
 }
 
+const StringPool::Entry* StringPool::FindString(std::u16string_view text) const {
+  std::shared_lock<std::shared_mutex> lock(m_mutex);
+  const auto found = m_index.find(text);
+  return found == m_index.end() ? nullptr : found->second;
+}
+
 std::size_t StringPool::GetSize() const {
   std::shared_lock<std::shared_mutex> lock(m_mutex);
   return m_entries.size();

@@ -11,6 +11,7 @@
 #include <deque>
 #include <functional>
 #include <memory>
+#include <optional>
 #include <shared_mutex>
 #include <string_view>
 #include <unordered_map>
@@ -29,6 +30,9 @@ public:
   // The entry for `text`, inserted on first use. Safe from several threads;
   // the returned pointer stays valid as long as the pool.
   const Entry* AddString(std::u16string_view text);
+  // The entry for `text` if the pool holds it already, else null; never
+  // inserts, so looking up names from outside cannot grow the pool.
+  const Entry* FindString(std::u16string_view text) const;
   // The entry of the empty text, without a lookup.
   const Entry* GetEmptyEntry() const noexcept { return m_empty; }
   std::size_t GetSize() const;
@@ -50,6 +54,14 @@ public:
   PooledString(const char16_t* text)
       : m_entry(Pool::Get().AddString(text ? std::u16string_view(text) : std::u16string_view())) {}
 
+  // The handle of `text` when it is pooled already; nothing when it is not.
+  // Unlike the constructors it never adds to the pool.
+  static std::optional<PooledString> Find(std::u16string_view text) {
+    if (const ZelStringT<char16_t>* entry = Pool::Get().FindString(text))
+      return PooledString(entry);
+    return std::nullopt;
+  }
+
   // A copy of the pooled text.
   ZelStringT<char16_t> ToString() const { return *m_entry; }
   // The pooled text itself; valid as long as the pool.
@@ -68,6 +80,8 @@ public:
   friend bool operator>=(PooledString a, PooledString b) noexcept { return !(a < b); }
 
 private:
+  explicit PooledString(const ZelStringT<char16_t>* entry) noexcept : m_entry(entry) {}
+
   const ZelStringT<char16_t>* m_entry;
 };
 

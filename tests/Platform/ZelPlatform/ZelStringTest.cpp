@@ -49,6 +49,17 @@ TEST(ZelStringTest, CompareNoCaseFoldsFullUnicode) {
     SCOPED_TRACE(Narrow(pair[0]) + " == " + Narrow(pair[1]));
     EXPECT_EQ(pair[0].CompareNoCase(pair[1]), 0);
   }
+  // An unpaired surrogate compares as the U+FFFD that documents write for it;
+  // a well-formed pair stays its own character.
+  const String16 replaced(u"a\uFFFD");
+  const char16_t high = 0xD800, low = 0xDC00;
+  for (const String16& lone : {String16(u"a") + String16(std::u16string(1, high)),
+                               String16(u"A") + String16(std::u16string(1, low))}) {
+    SCOPED_TRACE(Narrow(lone.GetView()));
+    EXPECT_EQ(lone.CompareNoCase(replaced), 0);
+    EXPECT_EQ(replaced.CompareNoCase(lone), 0);
+  }
+  EXPECT_LT(replaced.CompareNoCase(u"a\U00010000"), 0);
   // UTF-8 folds the same way; ill-formed bytes compare consistently.
   EXPECT_EQ(ZelStringT<char>("\xE2\x84\xAA").CompareNoCase("k"), 0);
   EXPECT_EQ(ZelStringT<char>("\xC3").CompareNoCase("\xC3"), 0);

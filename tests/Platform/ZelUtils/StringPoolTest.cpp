@@ -32,6 +32,11 @@ TEST(StringPoolTest, KeysCompareAndHashByEntry) {
   EXPECT_EQ(std::hash<Key>()(a), std::hash<const void*>()(&a.GetString()));
   // Order follows the entries' addresses, not the texts.
   EXPECT_EQ(a < b, std::less<const void*>()(&a.GetString(), &b.GetString()));
+  // Find answers for pooled texts only and never adds.
+  const std::size_t size = TestPool::Get().GetSize();
+  EXPECT_EQ(Key::Find(u"alpha"), a);
+  EXPECT_FALSE(Key::Find(u"gamma").has_value());
+  EXPECT_EQ(TestPool::Get().GetSize(), size);
 }
 
 // Entries never move, and threads interning the same texts in racing orders
