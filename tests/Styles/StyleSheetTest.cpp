@@ -8,8 +8,10 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <climits>
 #include <memory>
+#include <random>
 #include <string>
 #include <typeinfo>
 #include <vector>
@@ -96,21 +98,46 @@ private:
   int m_savedVersion = 0;
 };
 
+// Whatever leaves the sheet by a clash or a replacement, the styles that
+// referred to it follow the name; a style the sheet holds is never destroyed
+// by being offered again.
 TEST_F(StyleSheetTest, AddStyleClashKeepsOrReplaces) {
   StyleSheet sheet;
   Style* old = Add(sheet, u"red");
-  EXPECT_EQ(sheet.AddStyle(u"Red", MakeStyle(u"offered"), false), nullptr);
+  Style* child = Add(sheet, u"child", old);
+  Style* offered = MakeStyle(u"offered");
+  Style* follower = Add(sheet, u"follower", offered);
+  EXPECT_EQ(sheet.AddStyle(u"Red", offered, false), nullptr);
   EXPECT_EQ(DestroyedTags(), Names{u"offered"});
   EXPECT_EQ(sheet.GetStyle(u"RED"), old);
-  EXPECT_EQ(sheet.GetStyleNames(), Names{u"red"});
+  EXPECT_EQ(sheet.GetStyleNames(), (Names{u"child", u"follower", u"red"}));
+  EXPECT_EQ(follower->GetParent(), old);
 
   Style* newer = MakeStyle(u"newer");
+  newer->SetProperty(kSize, 30.0);
   std::unique_ptr<Style> previous(sheet.AddStyle(u"Red", newer, true));
   EXPECT_EQ(previous.get(), old);
   EXPECT_EQ(DestroyedTags(), Names{u"offered"});
   EXPECT_EQ(sheet.GetStyle(u"red"), newer);
-  EXPECT_EQ(sheet.GetStyleNames(), Names{u"Red"});
   EXPECT_EQ(sheet.GetStyleName(old), Text());
+  EXPECT_EQ(child->GetParent(), newer);
+  EXPECT_EQ(follower->GetParent(), newer);
+
+  // A replacement that inherits from the style it replaces takes over its
+  // values instead of inheriting from itself.
+  Style* derived = MakeStyle(u"derived", newer);
+  std::unique_ptr<Style> replaced(sheet.AddStyle(u"red", derived, true));
+  EXPECT_EQ(replaced.get(), newer);
+  EXPECT_EQ(derived->GetParent(), nullptr);
+  EXPECT_EQ(derived->GetProperty(kSize).Get<double>(), 30.0);
+  EXPECT_EQ(child->GetParent(), derived);
+
+  EXPECT_EQ(sheet.AddStyle(u"RED", derived, false), nullptr);
+  EXPECT_EQ(sheet.AddStyle(u"RED", derived, true), nullptr);      // re-spelled only
+  EXPECT_EQ(sheet.AddStyle(u"Crimson", derived, false), nullptr); // moves
+  EXPECT_EQ(DestroyedTags(), Names{u"offered"});
+  EXPECT_EQ(sheet.GetStyleNames(), (Names{u"child", u"Crimson", u"follower"}));
+  EXPECT_EQ(sheet.GetStyleName(derived), Text(u"Crimson"));
 }
 
 TEST_F(StyleSheetTest, NamesIgnoreCaseBeyondAsciiAndRenameRules) {
@@ -129,6 +156,19 @@ TEST_F(StyleSheetTest, NamesIgnoreCaseBeyondAsciiAndRenameRules) {
   EXPECT_EQ(sheet.GetStyleNames(), (Names{u"Crimson", u"\u00e4RGER"}));
   EXPECT_EQ(sheet.GetStyle(u"crimson"), blue);
   EXPECT_EQ(sheet.GetStyleName(anger), Text(u"\u00e4RGER"));
+
+  // Names that a document would write alike (an unpaired surrogate is written
+  // as U+FFFD) are one name, so a round trip cannot merge two styles.
+  const Text high = Text(u"x") + Text(std::u16string(1, char16_t(0xD800)));
+  const Text low = Text(u"X") + Text(std::u16string(1, char16_t(0xDC00)));
+  Style* lone = Add(sheet, high);
+  EXPECT_EQ(sheet.GetStyle(u"x\uFFFD"), lone);
+  EXPECT_EQ(sheet.AddStyle(low, MakeStyle(u"low"), false), nullptr);
+  EXPECT_EQ(sheet.GetStyle(low), lone);
+  StyleSheet copy;
+  ASSERT_TRUE(copy.ImportFromString(Export(sheet), true));
+  EXPECT_EQ(copy.GetStyles().size(), sheet.GetStyles().size());
+  EXPECT_NE(copy.GetStyle(high), nullptr);
 }
 
 // RemoveStyle only detaches; DeleteStyles first makes every style of the sheet
@@ -225,18 +265,25 @@ TEST_F(StyleSheetTest, ClearKeepsExternalIdAndResetsVersion) {
 
 // MergeIn walks the target's own index and forgets the source's names; both
 // halves are kept as hosts have always seen them.
-TEST_F(StyleSheetTest, MergeInKeepsItsHistoricBehaviour) {
-  StyleSheet target, source;
-  Style* incoming = Add(source, u"In");
-  Add(target, u"Own");
-
-  target.MergeIn(source, false);
-  EXPECT_EQ(DestroyedTags(), Names{u"Own"});
-  EXPECT_EQ(target.GetStyleNames(), Names{u"Own"}); // still listed, destroyed
-  EXPECT_TRUE(source.GetStyles().empty());
-  EXPECT_EQ(target.GetStyle(u"In"), nullptr);
-  target.RemoveStyle(Text(u"Own")); // detach the destroyed style before the sheet goes
-  delete incoming;
+TEST_F(StyleSheetTest, MergeInKeepsBothSheetsSound) {
+  for (const bool replace : {false, true}) {
+    SCOPED_TRACE(replace);
+    {
+      StyleSheet target, source;
+      Style* incoming = Add(source, u"In");
+      Style* own = Add(target, u"Own");
+      target.MergeIn(source, replace);
+      // This sheet's own styles go back where they were, nothing destroyed.
+      EXPECT_TRUE(DestroyedTags().empty());
+      EXPECT_EQ(target.GetStyle(u"own"), own);
+      EXPECT_EQ(target.GetStyle(u"In"), nullptr);
+      // The source forgets the names but still owns its styles.
+      EXPECT_TRUE(source.GetStyles().empty());
+      EXPECT_EQ(source.GetStyleName(incoming), Text(u"In"));
+    }
+    EXPECT_EQ(DestroyedTags(), (Names{u"In", u"Own"}));
+    DestroyedTags().clear();
+  }
 }
 
 TEST_F(StyleSheetTest, CopyContentsFromCopiesDeeplyAndTakesVersion) {
@@ -329,19 +376,174 @@ TEST_F(StyleSheetTest, ImportReplaceDecidesWhoWins) {
     SCOPED_TRACE(replace);
     DestroyedTags().clear();
     StyleSheet sheet;
-    Add(sheet, u"Body")->SetProperty(kSize, 10.0);
+    Style* body = Add(sheet, u"Body");
+    body->SetProperty(kSize, 10.0);
+    Style* child = Add(sheet, u"Child", body);
     ASSERT_TRUE(sheet.ImportFromString(uR"({"sheetTestParagraph": {"body": {"size": "30"},
                                                                   "X": {"size": "11"}},
                                             "sheetTestCharacter": {"x": {"font": "Mono"}}})",
                                        replace));
     EXPECT_EQ(DestroyedTags(), replace ? Names{u"Body"} : Names{});
-    EXPECT_EQ(sheet.GetStyleNames(), replace ? (Names{u"body", u"x"}) : (Names{u"Body", u"X"}));
+    EXPECT_EQ(sheet.GetStyleNames(),
+              replace ? (Names{u"body", u"Child", u"x"}) : (Names{u"Body", u"Child", u"X"}));
     EXPECT_EQ(sheet.GetStyle(u"Body")->GetProperty(kSize).Get<double>(), replace ? 30.0 : 10.0);
+    // The child of a replaced style follows its name, in memory and on disk.
+    EXPECT_EQ(child->GetParent(), sheet.GetStyle(u"Body"));
+    EXPECT_EQ(child->GetProperty(kSize).Get<double>(), replace ? 30.0 : 10.0);
+    EXPECT_NE(Export(sheet).GetView().find(u"\"Child\":{\"inherits\""), std::u16string_view::npos);
     Style* x = sheet.GetStyle(u"X");
     EXPECT_EQ(x->GetCategoryName(), kCharacter);
     EXPECT_EQ(x->GetProperty(kSize).Get<double>(), 11.0);
     EXPECT_EQ(x->GetProperty(kFont).Get<Text>(), Text(u"Mono"));
   }
+}
+
+// Each "inherits" is refused exactly when, as the document is read, it would
+// make a style its own ancestor: checked against a plain model on random
+// documents that repeat names across categories and "inherits" in a style.
+TEST_F(StyleSheetTest, ImportRefusesExactlyTheLinksThatCloseCycles) {
+  std::mt19937 random(11);
+  const auto name = [](int i) { return u"s" + std::u16string(1, static_cast<char16_t>(u'a' + i)); };
+  for (int round = 0; round < 400; ++round) {
+    const int count = 2 + static_cast<int>(random() % 10);
+    // Style members in document order, each with the styles it names.
+    std::vector<std::pair<int, std::vector<int>>> members;
+    std::vector<bool> present(count, false);
+    std::u16string document = u"{";
+    for (const char16_t* category : {u"sheetTestParagraph", u"sheetTestCharacter"}) {
+      document += std::u16string(document.size() > 1 ? u",\"" : u"\"") + category + u"\": {";
+      bool first = true;
+      for (int i = 0; i < count; ++i) {
+        if (random() % 3 == 0)
+          continue;
+        present[i] = true;
+        members.emplace_back(i, std::vector<int>());
+        document += (first ? u"\"" : u",\"") + name(i) + u"\": {";
+        first = false;
+        for (int k = 0, links = static_cast<int>(random() % 3); k < links; ++k) {
+          const int j = static_cast<int>(random() % count);
+          members.back().second.push_back(j);
+          document += (k ? u",\"inherits\": \"" : u"\"inherits\": \"") + name(j) + u"\"";
+        }
+        document += u"}";
+      }
+      document += u"}";
+    }
+    document += u"}";
+    // The model: a link holds unless the style is the named one or one of its
+    // ancestors; a name that no member lists is not in the sheet.
+    std::vector<int> parents(count, -1);
+    for (const auto& [i, named] : members) {
+      for (const int j : named) {
+        bool cycle = false;
+        for (int a = j; a >= 0 && !cycle; a = parents[a])
+          cycle = a == i;
+        if (!cycle && present[j])
+          parents[i] = j;
+      }
+    }
+    SCOPED_TRACE(::testing::Message() << "round " << round);
+    StyleSheet sheet;
+    ASSERT_TRUE(sheet.ImportFromString(Text(document), true));
+    for (int i = 0; i < count; ++i) {
+      if (!present[i])
+        continue;
+      const Style* style = sheet.GetStyle(Text(name(i)));
+      ASSERT_NE(style, nullptr);
+      EXPECT_EQ(style->GetParent(),
+                parents[i] < 0 ? nullptr : sheet.GetStyle(Text(name(parents[i]))));
+    }
+  }
+  // A style of the sheet that followed a replaced one cannot become its
+  // heir's parent.
+  StyleSheet sheet;
+  Add(sheet, u"Child", Add(sheet, u"Body"));
+  ASSERT_TRUE(
+      sheet.ImportFromString(uR"({"sheetTestParagraph": {"Body": {"inherits": "Child"}}})", true));
+  EXPECT_EQ(sheet.GetStyle(u"Child")->GetParent(), sheet.GetStyle(u"Body"));
+  EXPECT_EQ(sheet.GetStyle(u"Body")->GetParent(), nullptr);
+}
+
+// A chain of 200,000 styles, each inheriting from the one before, goes
+// through import in either order, export, lookup, every dependency query,
+// DeleteStyles and Flatten in linear time and constant stack.
+TEST_F(StyleSheetTest, LongChainsStayLinearAndShallow) {
+  constexpr int kLength = 200000;
+  const auto name = [](int i) { return u"S" + Text::FormatInternal("%d", i).GetStdString(); };
+  // Every seventh style sets the size to its number.
+  const auto effectiveSize = [](int i) { return static_cast<double>(i - i % 7); };
+  Text exported;
+  for (const bool rootFirst : {true, false}) {
+    SCOPED_TRACE(rootFirst);
+    std::u16string document = u"{\"sheetTestParagraph\": {";
+    for (int k = 0; k < kLength; ++k) {
+      const int i = rootFirst ? k : kLength - 1 - k;
+      document += (k ? u",\"" : u"\"") + name(i) + u"\": {";
+      if (i)
+        document += u"\"inherits\": \"" + name(i - 1) + (i % 7 ? u"\"" : u"\", ");
+      if (i % 7 == 0)
+        document += u"\"size\": \"" + Text::FormatInternal("%d", i).GetStdString() + u"\"";
+      document += u"}";
+    }
+    document += u"}}";
+    StyleSheet sheet;
+    ASSERT_TRUE(sheet.ImportFromString(Text(document), true));
+    EXPECT_EQ(sheet.GetStyle(name(kLength - 1))->GetParent(), sheet.GetStyle(name(kLength - 2)));
+    EXPECT_EQ(sheet.GetStyle(name(1))->GetParent(), sheet.GetStyle(name(0)));
+    if (rootFirst)
+      exported = Export(sheet);
+  }
+  // The export lists names in name order, neither root nor child first.
+  StyleSheet sheet;
+  ASSERT_TRUE(sheet.ImportFromString(exported, true));
+  EXPECT_EQ(Export(sheet), exported);
+
+  Style* root = sheet.GetStyle(name(0));
+  Style* middle = sheet.GetStyle(name(kLength / 2));
+  Style* last = sheet.GetStyle(name(kLength - 1));
+  EXPECT_EQ(last->GetProperty(kSize).Get<double>(), effectiveSize(kLength - 1));
+  EXPECT_EQ(last->GetProperty(kFont).Get<Text>(), Text(u"Serif")); // the category default
+
+  Style* const rootOnly[] = {root};
+  const StyleSpan rootSpan(rootOnly, rootOnly + 1, true);
+  const std::vector<Style*> both{middle, root};
+  EXPECT_FALSE(last->HasDependency(rootSpan, true));
+  EXPECT_TRUE(last->HasDependency(rootSpan, false));
+  EXPECT_TRUE(last->HasParentalDependency(rootSpan));
+  std::vector<Style*> expected = both;
+  std::sort(expected.begin(), expected.end(), std::less<>());
+  EXPECT_EQ(last->GetDependencies(StyleSpan(both, false), false), expected);
+  std::vector<Style*> dependents;
+  sheet.GetDependencies(rootSpan, dependents);
+  EXPECT_EQ(dependents.size(), static_cast<std::size_t>(kLength));
+
+  std::vector<Style*> doomed;
+  for (int i = 0; i < kLength; i += 10)
+    doomed.push_back(sheet.GetStyle(name(i)));
+  sheet.DeleteStyles(StyleSpan(doomed, false));
+  ASSERT_EQ(sheet.GetStyles().size(), static_cast<std::size_t>(kLength - kLength / 10));
+  for (int i = 1; i < kLength; i += 1 + (i % 10 == 9)) {
+    const Style* style = sheet.GetStyle(name(i));
+    ASSERT_EQ(style->GetProperty(kSize).Get<double>(), effectiveSize(i)) << i;
+    ASSERT_EQ(style->GetParent(), sheet.GetStyle(name(i - 1 - ((i - 1) % 10 == 0)))) << i;
+  }
+  EXPECT_TRUE(last->Flatten());
+  EXPECT_EQ(last->GetParent(), nullptr);
+  EXPECT_EQ(last->GetProperty(kSize).Get<double>(), effectiveSize(kLength - 1));
+}
+
+// Member names no category registers are looked up without being pooled, so
+// documents from outside cannot grow the process-wide pool.
+TEST_F(StyleSheetTest, UnknownMemberNamesDoNotGrowThePool) {
+  std::u16string document = uR"({"sheetTestParagraph": {"A": {"size": "2")";
+  for (int i = 0; i < 1000; ++i)
+    document += u", \"unknown " + Text::FormatInternal("%d", i).GetStdString() + u"\": \"x\"";
+  document += u"}}}";
+  const std::size_t size = StringPool::Get().GetSize();
+  StyleSheet sheet;
+  ASSERT_TRUE(sheet.ImportFromString(Text(document), true));
+  EXPECT_EQ(StringPool::Get().GetSize(), size);
+  EXPECT_EQ(sheet.GetStyle(u"A")->GetProperty(kSize).Get<double>(), 2.0);
 }
 
 TEST_F(StyleSheetTest, DamagedDocuments) {

@@ -482,6 +482,16 @@ TEST_F(StyleChainTest, RemoveDependencyKeepsEffectiveValues) {
 }
 
 TEST_F(StyleChainTest, RemoveDependencyOnAnAncestorFoldsTheChain) {
+  // Folding stops above the farthest ancestor in the span, also in a long
+  // unsorted span of styles foreign to the chain.
+  std::vector<Style*> withB(20, Para());
+  withB[7] = b;
+  c->RemoveDependency(Span(withB), false);
+  EXPECT_EQ(c->GetParent(), a);
+  EXPECT_EQ(Number(c->GetProperty(size)), 2.0);
+  c->SetParent(b);
+  c->ClearAllProperties();
+
   const std::vector<Style*> onlyA{a};
   c->RemoveDependency(Span(onlyA), false);
   EXPECT_EQ(c->GetParent(), nullptr);

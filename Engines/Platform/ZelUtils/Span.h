@@ -55,4 +55,18 @@ private:
   bool m_sorted = false;
 };
 
+// `span` when its membership tests are cheap (it is sorted, or short enough
+// to scan); otherwise a sorted copy of it, kept in `storage`, so that many
+// tests against a long unsorted span cost a logarithm each.
+template <class T, class Less>
+maybe_sorted_span<T, Less> MakeSearchable(maybe_sorted_span<T, Less> span,
+                                          std::vector<std::remove_const_t<T>>& storage) {
+  constexpr std::size_t kLinearLimit = 16;
+  if (span.is_sorted() || span.size() <= kLinearLimit)
+    return span;
+  storage.assign(span.begin(), span.end());
+  std::sort(storage.begin(), storage.end(), Less());
+  return maybe_sorted_span<T, Less>(storage, true);
+}
+
 } // namespace ZelUtils

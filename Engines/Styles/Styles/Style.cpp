@@ -11,7 +11,9 @@
 #include <algorithm>
 #include <exception>
 #include <memory>
+#include <optional>
 #include <typeinfo>
+#include <unordered_map>
 
 namespace Styles {
 
@@ -49,6 +51,40 @@ private:
   std::vector<PropertyKey> m_spill;
   std::size_t m_size = 0;
 };
+
+// The answers of HasDependency(span, false) already found during one
+// sheet-wide query. While it lives, every dependency query for the same span
+// on this thread, also those that behaviours make for substyles, stops at the
+// first ancestor with a known answer, so each chain is walked once.
+class DependencyMemo {
+public:
+  explicit DependencyMemo(StyleSpan span) : m_span(span), m_previous(s_active) { s_active = this; }
+  ~DependencyMemo() { s_active = m_previous; }
+  DependencyMemo(const DependencyMemo&) = delete;
+  DependencyMemo& operator=(const DependencyMemo&) = delete;
+
+  // The memo of the query under way for exactly this span, or null.
+  static DependencyMemo* Active(StyleSpan span) {
+    DependencyMemo* memo = s_active;
+    return memo && memo->m_span.begin() == span.begin() && memo->m_span.end() == span.end() &&
+                   memo->m_span.is_sorted() == span.is_sorted()
+               ? memo
+               : nullptr;
+  }
+  const bool* Find(const Style* style) const {
+    const auto found = m_known.find(style);
+    return found == m_known.end() ? nullptr : &found->second;
+  }
+  void Set(const Style* style, bool depends) const { m_known[style] = depends; }
+
+private:
+  static thread_local DependencyMemo* s_active;
+  StyleSpan m_span;
+  DependencyMemo* m_previous;
+  mutable std::unordered_map<const Style*, bool> m_known;
+};
+
+thread_local DependencyMemo* DependencyMemo::s_active = nullptr;
 
 // The keys of a style's own values, taken before a loop that may edit them.
 std::vector<PropertyKey> OwnKeys(const PropertyMap& properties) {
@@ -680,20 +716,62 @@ void Style::CopySubstyleProperties(const Style* source, const PropertyKey& key) 
 // ---------------------------------------------------------------------------
 // Dependencies
 
+bool Style::ValuesDepend(StyleSpan styles, bool parentOnly) const {
+  for (const PropertyMap::Entry& entry : m_properties)
+    if (const BaseStyleProperty* behaviour = FindBehaviour(entry.first))
+      if (behaviour->HasDependency(entry.second, styles, parentOnly))
+        return true;
+  return false;
+}
+
+bool Style::AncestorsDepend(StyleSpan styles) const {
+  DependencyMemo* memo = DependencyMemo::Active(styles);
+  const Style* ancestor = m_parent;
+  bool depends = false;
+  for (; ancestor; ancestor = ancestor->m_parent) {
+    if (memo) {
+      if (const bool* known = memo->Find(ancestor)) {
+        depends = *known;
+        break;
+      }
+    }
+    if (styles.contains(ancestor) || ancestor->ValuesDepend(styles, false)) {
+      depends = true;
+      break;
+    }
+  }
+  // What was learnt holds for every ancestor passed on the way: each of them
+  // depends exactly when the answer found above it does.
+  if (memo)
+    for (const Style* passed = m_parent; passed != ancestor; passed = passed->m_parent)
+      memo->Set(passed, depends);
+  return depends;
+}
+
 bool Style::HasDependency(StyleSpan styles, bool parentOnly) const {
   if (styles.contains(this))
     return true;
   if (m_parent) {
     if (styles.contains(m_parent))
       return true;
-    if (!parentOnly && m_parent->HasDependency(styles, false))
+    if (!parentOnly && AncestorsDepend(styles))
       return true;
   }
-  for (const PropertyMap::Entry& entry : m_properties)
-    if (const BaseStyleProperty* behaviour = FindBehaviour(entry.first))
-      if (behaviour->HasDependency(entry.second, styles, parentOnly))
-        return true;
-  return false;
+  return ValuesDepend(styles, parentOnly);
+}
+
+void Style::AppendDependents(const std::vector<Style*>& styles, StyleSpan span,
+                             std::vector<Style*>& out) {
+  const DependencyMemo memo(span);
+  for (Style* style : styles) {
+    if (!style)
+      continue;
+    const bool* known = memo.Find(style);
+    const bool depends = known ? *known : style->HasDependency(span, false);
+    memo.Set(style, depends);
+    if (depends)
+      out.push_back(style);
+  }
 }
 
 std::vector<Style*> Style::GetDependencies(StyleSpan styles, bool parentOnly) const {
@@ -704,6 +782,16 @@ std::vector<Style*> Style::GetDependencies(StyleSpan styles, bool parentOnly) co
   return GetDependenciesImpl(StyleSpan(sorted, true), parentOnly);
 }
 
+void Style::AppendValueDependencies(StyleSpan styles, bool parentOnly,
+                                    std::vector<Style*>& out) const {
+  for (const PropertyMap::Entry& entry : m_properties) {
+    if (const BaseStyleProperty* behaviour = FindBehaviour(entry.first)) {
+      const std::vector<Style*> held = behaviour->GetDependencies(entry.second, styles, parentOnly);
+      out.insert(out.end(), held.begin(), held.end());
+    }
+  }
+}
+
 std::vector<Style*> Style::GetDependenciesImpl(StyleSpan styles, bool parentOnly) const {
   std::vector<Style*> result;
   if (styles.contains(this))
@@ -711,17 +799,16 @@ std::vector<Style*> Style::GetDependenciesImpl(StyleSpan styles, bool parentOnly
   if (m_parent && styles.contains(m_parent))
     result.push_back(m_parent);
   if (!styles.empty()) {
-    if (!parentOnly && m_parent) {
-      const std::vector<Style*> inherited = m_parent->GetDependencies(styles, false);
-      result.insert(result.end(), inherited.begin(), inherited.end());
-    }
-    for (const PropertyMap::Entry& entry : m_properties) {
-      if (const BaseStyleProperty* behaviour = FindBehaviour(entry.first)) {
-        const std::vector<Style*> held =
-            behaviour->GetDependencies(entry.second, styles, parentOnly);
-        result.insert(result.end(), held.begin(), held.end());
+    // With the whole chain asked for, every ancestor adds itself when it is
+    // one of `styles`, and what its own values depend on.
+    if (!parentOnly) {
+      for (const Style* ancestor = m_parent; ancestor; ancestor = ancestor->m_parent) {
+        if (ancestor->m_parent && styles.contains(ancestor->m_parent))
+          result.push_back(ancestor->m_parent);
+        ancestor->AppendValueDependencies(styles, false, result);
       }
     }
+    AppendValueDependencies(styles, parentOnly, result);
   }
   std::sort(result.begin(), result.end(), std::less<>());
   result.erase(std::unique(result.begin(), result.end()), result.end());
@@ -729,10 +816,8 @@ std::vector<Style*> Style::GetDependenciesImpl(StyleSpan styles, bool parentOnly
 }
 
 bool Style::HasParentalDependency(StyleSpan styles) const {
-  for (const Style* ancestor = m_parent; ancestor; ancestor = ancestor->m_parent)
-    if (styles.contains(ancestor) || ancestor->HasDependency(styles, false))
-      return true;
-  return false;
+  // The parent's own answer already covers every ancestor above it.
+  return m_parent && (styles.contains(m_parent) || m_parent->HasDependency(styles, false));
 }
 
 bool Style::HasParentalDependency() const {
@@ -757,17 +842,19 @@ void Style::RemoveDependency(StyleSpan styles, bool parentOnly) {
     while (m_parent && styles.contains(m_parent))
       MergeParent();
   } else if (m_parent) {
-    for (Style* removed : styles) {
-      if (!m_parent)
-        break;
-      bool isAncestor = false;
-      for (const Style* ancestor = m_parent; ancestor && !isAncestor; ancestor = ancestor->m_parent)
-        isAncestor = ancestor == removed;
-      if (isAncestor) {
-        const Style* stop = removed->m_parent;
-        while (m_parent && m_parent != stop)
-          MergeParent();
-      }
+    // Taking the styles of the span one by one, each found among the
+    // ancestors is merged in with everything below it; together that is every
+    // ancestor up to the farthest one in the span, found here in one walk.
+    std::vector<Style*> storage;
+    const StyleSpan searchable = ZelUtils::MakeSearchable(styles, storage);
+    const Style* farthest = nullptr;
+    for (const Style* ancestor = m_parent; ancestor; ancestor = ancestor->m_parent)
+      if (searchable.contains(ancestor))
+        farthest = ancestor;
+    if (farthest) {
+      const Style* stop = farthest->m_parent;
+      while (m_parent && m_parent != stop)
+        MergeParent();
     }
   }
   for (std::size_t i = 0; i < m_properties.size(); ++i)
@@ -890,7 +977,7 @@ void Style::DeserializeJson(const StyleSheet& sheet, const Json::Object& object)
       Style* parent = sheet.GetStyle(renamed != info.renames.end() ? renamed->second : *parentName);
       // Never this style itself, nor a style that already inherits from it:
       // a parent cycle would make every lookup endless.
-      if (parent && !IsAncestorOrSelf(parent))
+      if (parent && sheet.AcceptParent(*this, *parent))
         m_parent = parent;
     } else if (name == k_strExternalID) {
       const ZelStringT<char16_t>* id = value.GetIf<ZelStringT<char16_t>>();
@@ -901,7 +988,11 @@ void Style::DeserializeJson(const StyleSheet& sheet, const Json::Object& object)
       if (externalName && !externalName->IsEmpty())
         SetExternalName(*externalName);
     } else {
-      const BaseStyleProperty* behaviour = manager.GetStyleProperty(categoryKey, PropertyKey(name));
+      // A name that is not pooled yet cannot be a registered property; looking
+      // it up without adding it keeps documents from growing the pool.
+      const std::optional<PropertyKey> key = PropertyKey::Find(name.GetView());
+      const BaseStyleProperty* behaviour =
+          key ? manager.GetStyleProperty(categoryKey, *key) : nullptr;
       if (!behaviour)
         continue;
       if (behaviour->IsDeprecated()) {

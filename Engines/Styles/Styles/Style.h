@@ -258,6 +258,8 @@ public:
   Style* CreateStyleCloneWithNoDependencyOnOwner() const;
 
   // Dependencies on other styles: itself, its parents and what values hold.
+  // Every walk along the parent chain is a loop: any length of chain is
+  // answered in linear time and constant stack.
   bool HasDependency(StyleSpan styles, bool parentOnly) const;
   // The styles of `styles` this style depends on, sorted, without repeats.
   std::vector<Style*> GetDependencies(StyleSpan styles, bool parentOnly) const;
@@ -305,6 +307,18 @@ private:
   void MergeParent();
   // Whether this style is `style` or one of its ancestors.
   bool IsAncestorOrSelf(const Style* style) const noexcept;
+  // Whether one of the style's own values depends on `styles`.
+  bool ValuesDepend(StyleSpan styles, bool parentOnly) const;
+  // Whether an ancestor is in `styles` or holds a value depending on them.
+  bool AncestorsDepend(StyleSpan styles) const;
+  // Appends the dependencies of the style's own values.
+  void AppendValueDependencies(StyleSpan styles, bool parentOnly, std::vector<Style*>& out) const;
+
+  friend class StyleSheet;
+  // Appends to `out`, in their order, the styles of `styles` for which
+  // HasDependency(span, false) holds, answering every shared ancestor once.
+  static void AppendDependents(const std::vector<Style*>& styles, StyleSpan span,
+                               std::vector<Style*>& out);
   const ZelUtils::Any& DefaultValue(const PropertyKey& key) const;
 
   PropertyMap m_properties;

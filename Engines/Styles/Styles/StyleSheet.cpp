@@ -10,8 +10,10 @@
 #include <cassert>
 #include <climits>
 #include <cmath>
+#include <cstdint>
 #include <iterator>
 #include <memory>
+#include <unordered_map>
 #include <utility>
 
 namespace Styles {
@@ -44,6 +46,137 @@ int TruncateVersion(double number) {
 
 } // namespace
 
+namespace detail {
+
+// The parent links of the styles an import touches, as a forest whose paths
+// are kept in splay trees (a link-cut forest), so that whether a new link
+// would close a cycle takes amortised logarithmic time, and constant time for
+// the shapes real documents have, however long their chains. A style enters
+// the forest, with its whole chain, the first time it is to be a parent; a
+// child that is not in it cannot be an ancestor of anything and is linked at
+// once. The forest stays exact as long as parent links change only through
+// it while the import runs.
+class ParentForest {
+public:
+  // Whether `child` may inherit from `parent` (false when `child` is `parent`
+  // or one of its ancestors); when it may, the new link is recorded.
+  bool Link(const Style* child, const Style* parent) {
+    if (child == parent)
+      return false;
+    const std::uint32_t above = Load(parent);
+    const std::uint32_t node = Find(child);
+    if (node == kNone)
+      return true;
+    Cut(node);
+    if (FindRoot(above) == node) {
+      if (const Style* current = child->GetParent())
+        Attach(node, Find(current));
+      return false;
+    }
+    Attach(node, above);
+    return true;
+  }
+
+private:
+  static constexpr std::uint32_t kNone = ~std::uint32_t(0);
+  struct Node {
+    std::uint32_t child[2] = {kNone, kNone};
+    std::uint32_t up = kNone; // parent in the splay tree, else the path's parent
+  };
+
+  std::uint32_t Find(const Style* style) const {
+    const auto found = m_index.find(style);
+    return found == m_index.end() ? kNone : found->second;
+  }
+  // The node of `style`, made with those of its ancestors when missing.
+  std::uint32_t Load(const Style* style) {
+    std::uint32_t above = Find(style);
+    if (above != kNone)
+      return above;
+    m_chain.clear();
+    for (const Style* ancestor = style; ancestor; ancestor = ancestor->GetParent()) {
+      if ((above = Find(ancestor)) != kNone)
+        break;
+      m_chain.push_back(ancestor);
+    }
+    for (auto it = m_chain.rbegin(); it != m_chain.rend(); ++it) {
+      const auto node = static_cast<std::uint32_t>(m_nodes.size());
+      m_nodes.emplace_back();
+      m_index.emplace(*it, node);
+      if (above != kNone)
+        Attach(node, above);
+      above = node;
+    }
+    return above;
+  }
+  bool IsSplayRoot(std::uint32_t x) const {
+    const std::uint32_t up = m_nodes[x].up;
+    return up == kNone || (m_nodes[up].child[0] != x && m_nodes[up].child[1] != x);
+  }
+  void Rotate(std::uint32_t x) {
+    const std::uint32_t y = m_nodes[x].up;
+    const std::uint32_t z = m_nodes[y].up;
+    const int side = m_nodes[y].child[1] == x ? 1 : 0;
+    if (!IsSplayRoot(y))
+      m_nodes[z].child[m_nodes[z].child[1] == y ? 1 : 0] = x;
+    m_nodes[x].up = z;
+    const std::uint32_t moved = m_nodes[x].child[1 - side];
+    m_nodes[y].child[side] = moved;
+    if (moved != kNone)
+      m_nodes[moved].up = y;
+    m_nodes[x].child[1 - side] = y;
+    m_nodes[y].up = x;
+  }
+  void Splay(std::uint32_t x) {
+    while (!IsSplayRoot(x)) {
+      const std::uint32_t y = m_nodes[x].up;
+      if (!IsSplayRoot(y)) {
+        const std::uint32_t z = m_nodes[y].up;
+        const bool sameSide = (m_nodes[z].child[0] == y) == (m_nodes[y].child[0] == x);
+        Rotate(sameSide ? y : x);
+      }
+      Rotate(x);
+    }
+  }
+  // Makes the path from x's root down to x one splay tree, rooted at x.
+  void Access(std::uint32_t x) {
+    std::uint32_t below = kNone;
+    for (std::uint32_t y = x; y != kNone; y = m_nodes[y].up) {
+      Splay(y);
+      m_nodes[y].child[1] = below;
+      below = y;
+    }
+    Splay(x);
+  }
+  std::uint32_t FindRoot(std::uint32_t x) {
+    Access(x);
+    while (m_nodes[x].child[0] != kNone)
+      x = m_nodes[x].child[0];
+    Splay(x);
+    return x;
+  }
+  // Links the root x below `parent`.
+  void Attach(std::uint32_t x, std::uint32_t parent) {
+    Access(x);
+    m_nodes[x].up = parent;
+  }
+  // Cuts x from its parent, if it has one.
+  void Cut(std::uint32_t x) {
+    Access(x);
+    const std::uint32_t above = m_nodes[x].child[0];
+    if (above != kNone) {
+      m_nodes[above].up = kNone;
+      m_nodes[x].child[0] = kNone;
+    }
+  }
+
+  std::vector<Node> m_nodes;
+  std::unordered_map<const Style*, std::uint32_t> m_index;
+  std::vector<const Style*> m_chain; // scratch of Load
+};
+
+} // namespace detail
+
 IStyleSheetDuplicationContext::~IStyleSheetDuplicationContext() = default;
 
 StyleSheet::StyleSheet()
@@ -60,28 +193,61 @@ void StyleSheet::Clear() {
   m_version = GetStyleManager().GetCurrentVersion();
   NameIndex styles;
   styles.swap(*m_styles);
-  m_names->clear();
-  for (auto& entry : styles)
+  PointerIndex names;
+  names.swap(*m_names);
+  for (auto& entry : styles) {
+    names.erase(entry.second);
     delete entry.second;
+  }
+  // Styles known only by pointer (MergeIn dropped their names) are the
+  // sheet's too.
+  for (auto& entry : names)
+    delete entry.first;
 }
 
 Style* StyleSheet::AddStyle(const ZelStringT<char16_t>& name, Style* style, bool replace) {
+  if (style) {
+    const auto filedAs = m_names->find(style);
+    if (filedAs != m_names->end()) {
+      const auto found = m_styles->find(name);
+      if (found != m_styles->end() && found->second == style) {
+        // Already filed under this name: destroying or handing it back would
+        // leave the sheet listing a style it no longer has.
+        if (replace) {
+          const ZelStringT<char16_t> current = found->first;
+          RenameStyle(current, name);
+        }
+        return nullptr;
+      }
+      // Filed under another name: it leaves that one, so that the sheet never
+      // lists one style twice.
+      DetachByPointerEntry(filedAs);
+    }
+  }
   Style* previous = nullptr;
-  FileStyle(name, style, replace, previous);
+  const auto [entry, filed] = FileStyle(name, style, replace, previous);
+  if (!filed) {
+    // The style already in the sheet wins; whatever referred to the offered
+    // one follows the name.
+    if (style) {
+      Redirect({{style, entry->second}});
+      delete style;
+    }
+    return nullptr;
+  }
+  if (previous)
+    Redirect({{previous, style}});
   return previous;
 }
 
-StyleSheet::NameIndex::iterator StyleSheet::FileStyle(const ZelStringT<char16_t>& name,
-                                                      Style* style, bool replace,
-                                                      Style*& previous) {
+std::pair<StyleSheet::NameIndex::iterator, bool>
+StyleSheet::FileStyle(const ZelStringT<char16_t>& name, Style* style, bool replace,
+                      Style*& previous) {
   previous = nullptr;
   const auto found = m_styles->lower_bound(name);
   const bool present = found != m_styles->end() && !m_styles->key_comp()(name, found->first);
-  if (present && !replace) {
-    // The style already in the sheet wins.
-    delete style;
-    return found;
-  }
+  if (present && !replace)
+    return {found, false};
   Style* const removed = present ? found->second : nullptr;
   NameIndex::iterator filed;
   try {
@@ -117,7 +283,40 @@ StyleSheet::NameIndex::iterator StyleSheet::FileStyle(const ZelStringT<char16_t>
     throw;
   }
   previous = removed;
-  return filed;
+  return {filed, true};
+}
+
+void StyleSheet::Redirect(const std::map<Style*, Style*>& heirs) {
+  if (heirs.empty())
+    return;
+  // Styles that an heir is or inherits from cannot take it as parent without
+  // a cycle, and nothing can take a null heir: those take over the old
+  // style's values instead, as DeleteStyles would do.
+  std::vector<Style*> olds, heirLines;
+  for (const auto& [old, heir] : heirs) {
+    olds.push_back(old);
+    for (Style* style = heir; style; style = style->GetParent())
+      heirLines.push_back(style);
+  }
+  std::sort(heirLines.begin(), heirLines.end());
+  const StyleSpan doomed(olds, true);
+  const bool anyNull = std::any_of(heirs.begin(), heirs.end(),
+                                   [](const auto& pair) { return pair.second == nullptr; });
+  for (auto& entry : *m_styles) {
+    Style* style = entry.second;
+    if (!style)
+      continue;
+    if (anyNull || std::binary_search(heirLines.begin(), heirLines.end(), style))
+      style->RemoveDependency(doomed, true);
+    else
+      style->RemapDependency(heirs);
+  }
+}
+
+bool StyleSheet::AcceptParent(Style& child, Style& parent) const {
+  if (m_import)
+    return m_import->Link(&child, &parent);
+  return !child.IsAncestorOrSelf(&parent);
 }
 
 Style* StyleSheet::RemoveStyle(const ZelStringT<char16_t>& name) {
@@ -131,12 +330,11 @@ Style* StyleSheet::RemoveStyle(const ZelStringT<char16_t>& name) {
 }
 
 Style* StyleSheet::DetachByPointerEntry(PointerIndex::iterator entry) {
+  Style* style = const_cast<Style*>(entry->first);
   const auto found = m_styles->find(entry->second);
-  if (found == m_styles->end())
-    return nullptr;
-  Style* style = found->second;
-  m_styles->erase(found);
-  m_names->erase(style);
+  if (found != m_styles->end() && found->second == style)
+    m_styles->erase(found);
+  m_names->erase(entry);
   return style;
 }
 
@@ -153,9 +351,11 @@ bool StyleSheet::RemoveStyle(Style* style) {
 void StyleSheet::DeleteStyles(StyleSpan styles) {
   // Every style drops its references first, the doomed ones included, so
   // that no surviving style is left pointing at a destroyed one.
+  std::vector<Style*> storage;
+  const StyleSpan doomed = ZelUtils::MakeSearchable(styles, storage);
   for (auto& entry : *m_styles)
     if (entry.second)
-      entry.second->RemoveDependency(styles, true);
+      entry.second->RemoveDependency(doomed, true);
   for (Style* style : styles) {
     if (!style)
       continue;
@@ -270,9 +470,7 @@ void StyleSheet::GenerateCategoryStyleMap(CategoryStyleMap& out) const {
 }
 
 void StyleSheet::GetDependencies(StyleSpan styles, std::vector<Style*>& out) const {
-  for (const auto& entry : *m_styles)
-    if (entry.second && entry.second->HasDependency(styles, false))
-      out.push_back(entry.second);
+  Style::AppendDependents(GetStyles(), styles, out);
 }
 
 Style* StyleSheet::GetExternalStyleAlias(const ZelStringT<char16_t>& externalID,
@@ -333,6 +531,26 @@ void StyleSheet::ExportJson(JsonValue& out, bool includeTemporary) const {
   }
 }
 
+namespace {
+
+// Points the sheet's import bookkeeping at a forest for as long as it lives.
+class ImportScope {
+public:
+  explicit ImportScope(detail::ParentForest*& slot) : m_slot(slot), m_previous(slot) {
+    slot = &m_forest;
+  }
+  ~ImportScope() { m_slot = m_previous; }
+  ImportScope(const ImportScope&) = delete;
+  ImportScope& operator=(const ImportScope&) = delete;
+
+private:
+  detail::ParentForest m_forest;
+  detail::ParentForest*& m_slot;
+  detail::ParentForest* m_previous;
+};
+
+} // namespace
+
 bool StyleSheet::ImportJson(Json::Object* document, bool replace) {
   assert(document && "ImportJson needs a document");
   if (!document)
@@ -345,59 +563,94 @@ bool StyleSheet::ImportJson(Json::Object* document, bool replace) {
   // order. Import never erases an entry (a replacement re-files it), so the
   // second pass reads each entry instead of searching for the name again.
   std::vector<const NameIndex::value_type*> filed;
+  // Styles that replacements took out of the sheet, with the entry of the
+  // name each held. They are destroyed after the first pass, once every style
+  // that referred to one refers to the style holding its name at that time.
+  std::vector<std::pair<Style*, const NameIndex::value_type*>> replaced;
+  const auto repairReplaced = [this, &replaced] {
+    std::map<Style*, Style*> heirs;
+    for (const auto& [old, entry] : replaced)
+      heirs[old] = entry->second;
+    Redirect(heirs);
+    for (const auto& old : replaced)
+      delete old.first;
+    replaced.clear();
+  };
   bool versionSeen = false;
 
   // The members are gone through twice. The first pass makes an empty style
   // for every name, so that every reference resolves when the second pass
   // reads the styles; the version and the ID are applied in both.
   const std::size_t memberCount = document->GetSize();
-  for (int pass = 0; pass < 2; ++pass) {
-    std::size_t next = 0;
+  const auto applySheetMember = [&](const ZelStringT<char16_t>& name, const Json::Value& value) {
+    if (const double* number = value.GetIf<double>()) {
+      if (NameEquals(name, k_strVersion)) {
+        m_version = TruncateVersion(*number);
+        versionSeen = true;
+      }
+    } else if (const ZelStringT<char16_t>* text = value.GetIf<ZelStringT<char16_t>>()) {
+      // The document's ID is taken only by a sheet that already has one.
+      if (NameEquals(name, k_strExternalID) && !m_externalID.IsEmpty())
+        m_externalID = *text;
+    }
+  };
+
+  try {
     for (std::size_t i = 0; i < memberCount; ++i) {
       const ZelStringT<char16_t>& name = document->GetValueName(i);
       const Json::Value& value = document->GetValue(i);
-      if (const Json::Object* category = value.GetIf<Json::Object>()) {
-        if (!manager.CategoryExists(name))
-          continue;
-        const std::size_t styleCount = category->GetSize();
-        if (pass == 0) {
-          for (std::size_t j = 0; j < styleCount; ++j) {
-            category->GetValue(j).Get<Json::Object>(); // std::bad_cast for a non-object
-            std::unique_ptr<Style> style(new Style);
-            created.push_back(style.get());
-            Style* previous = nullptr;
-            const auto entry =
-                FileStyle(category->GetValueName(j), style.release(), replace, previous);
-            delete previous;
-            filed.push_back(&*entry);
-          }
-          continue;
-        }
-        const PropertyKey categoryKey(name);
-        for (std::size_t j = 0; j < styleCount; ++j) {
-          Style* style = filed[next++]->second;
-          if (!std::binary_search(created.begin(), created.end(), style))
-            continue;
-          style->SetCategory(categoryKey);
-          style->DeserializeJson(*this, category->GetValue(j).Get<Json::Object>());
-          if (!m_externalID.IsEmpty())
-            style->SetExternalID(m_externalID);
-        }
-      } else if (const double* number = value.GetIf<double>()) {
-        if (NameEquals(name, k_strVersion)) {
-          m_version = TruncateVersion(*number);
-          versionSeen = true;
-        }
-      } else if (const ZelStringT<char16_t>* text = value.GetIf<ZelStringT<char16_t>>()) {
-        // The document's ID is taken only by a sheet that already has one.
-        if (NameEquals(name, k_strExternalID) && !m_externalID.IsEmpty())
-          m_externalID = *text;
+      const Json::Object* category = value.GetIf<Json::Object>();
+      if (!category) {
+        applySheetMember(name, value);
+        continue;
+      }
+      if (!manager.CategoryExists(name))
+        continue;
+      for (std::size_t j = 0; j < category->GetSize(); ++j) {
+        category->GetValue(j).Get<Json::Object>(); // std::bad_cast for a non-object
+        std::unique_ptr<Style> style(new Style);
+        created.push_back(style.get());
+        Style* previous = nullptr;
+        const auto [entry, isFiled] =
+            FileStyle(category->GetValueName(j), style.get(), replace, previous);
+        if (isFiled)
+          style.release();
+        if (previous)
+          replaced.emplace_back(previous, &*entry);
+        filed.push_back(&*entry);
       }
     }
-    // An address freed in the first pass can only have been reused by a
-    // style made later in it, so membership in `created` stays exact.
-    if (pass == 0)
-      std::sort(created.begin(), created.end());
+  } catch (...) {
+    repairReplaced();
+    throw;
+  }
+  repairReplaced();
+  // An address freed in the first pass can only have been reused by a style
+  // made later in it, so membership in `created` stays exact.
+  std::sort(created.begin(), created.end());
+
+  const ImportScope scope(m_import);
+  std::size_t next = 0;
+  for (std::size_t i = 0; i < memberCount; ++i) {
+    const ZelStringT<char16_t>& name = document->GetValueName(i);
+    const Json::Value& value = document->GetValue(i);
+    const Json::Object* category = value.GetIf<Json::Object>();
+    if (!category) {
+      applySheetMember(name, value);
+      continue;
+    }
+    if (!manager.CategoryExists(name))
+      continue;
+    const PropertyKey categoryKey(name);
+    for (std::size_t j = 0; j < category->GetSize(); ++j) {
+      Style* style = filed[next++]->second;
+      if (!std::binary_search(created.begin(), created.end(), style))
+        continue;
+      style->SetCategory(categoryKey);
+      style->DeserializeJson(*this, category->GetValue(j).Get<Json::Object>());
+      if (!m_externalID.IsEmpty())
+        style->SetExternalID(m_externalID);
+    }
   }
 
   if (!versionSeen)

@@ -17,6 +17,10 @@
 
 namespace Styles {
 
+namespace detail {
+class ParentForest;
+} // namespace detail
+
 // Told about every style that StyleSheet::CopyContentsFrom creates.
 class STYLES_API IStyleSheetDuplicationContext {
 public:
@@ -27,6 +31,15 @@ public:
   virtual ~IStyleSheetDuplicationContext();
 };
 
+// Names are compared ignoring letter case, and with every unpaired surrogate
+// taken as U+FFFD, the character a document writes in its place: two names
+// that would be written alike are one name, so a sheet never holds styles
+// whose names collide when its document is read back.
+//
+// No style of the sheet is ever left pointing at a style the sheet destroys:
+// where a style leaves the sheet by replacement or a name clash, the styles
+// that referred to it are repaired (see AddStyle and ImportJson). Styles
+// outside the sheet that refer to its styles are the caller's to repair.
 class STYLES_API StyleSheet {
 public:
   // Style names ordered ignoring letter case; two names differing only in
@@ -62,6 +75,11 @@ public:
   // (0 when it has none) and takes the document's "id" only when the sheet
   // already has an external ID. Returns true. Throws std::bad_cast for a
   // style member that is not an object; behaviour exceptions pass through.
+  // A style of the sheet replaced by the document is destroyed, and every
+  // style that referred to it refers to the document's style of that name
+  // instead. An "inherits" that would close a parent cycle is ignored (the
+  // style keeps its parent); time and stack stay linear in the document
+  // whatever the length of its inheritance chains.
   virtual bool ImportJson(Json::Object* document, bool replace);
   virtual void SetExternalID(const ZelStringT<char16_t>& id);
 
@@ -69,14 +87,21 @@ public:
   void SetVersion(int version) noexcept { m_version = version; }
 
   // Destroys every style (in name order), empties the sheet and resets the
-  // version to the manager's current version. The external ID stays.
+  // version to the manager's current version. The external ID stays. Every
+  // style of the sheet goes, so none is left pointing at another.
   void Clear();
 
   // Files `style` under `name`; the sheet takes ownership of `style` in every
   // case. With `replace`, a style already filed under `name` (in any letter
-  // case) is detached and returned: the caller owns it and should destroy it.
-  // Without, a clash destroys `style` and keeps the existing one. Returns null
-  // when nothing was replaced. The name is taken as it is, even empty.
+  // case) is detached and returned: the caller owns it and should destroy it;
+  // the sheet's styles that referred to it now refer to `style` (one that
+  // `style` itself inherits from takes over the old style's values instead,
+  // so that no parent cycle arises). Without `replace`, a clash destroys
+  // `style` and keeps the existing one; styles that referred to `style` refer
+  // to the existing one. Returns null when nothing was replaced. The name is
+  // taken as it is, even empty. A style the sheet already holds is never
+  // destroyed nor listed twice: offered under its own name it stays (re-spelled
+  // with `replace`); under another name it moves to the new one.
   Style* AddStyle(const ZelStringT<char16_t>& name, Style* style, bool replace);
   // Detaches the style filed under `name` and returns it (the caller owns it
   // from now on), or null. Styles that refer to it are not repaired.
@@ -94,10 +119,12 @@ public:
   void RenameStyle(const ZelStringT<char16_t>& oldName, const ZelStringT<char16_t>& newName);
   // Offers each of this sheet's own styles back to this sheet's AddStyle
   // under its own name and destroys what AddStyle returns, then forgets the
-  // names of `other`'s styles (they are neither moved nor destroyed). Kept as
-  // it always behaved, which hosts must know: afterwards this sheet still
-  // lists its destroyed styles, so detach them (RemoveStyle) before clearing
-  // or destroying the sheet, and `other`'s styles are the caller's to delete.
+  // names of `other`'s styles. Kept as it always behaved, which hosts must
+  // know: `other`'s styles are not moved here. Since AddStyle keeps a style
+  // already filed under its own name, this sheet ends as it was. `other`'s
+  // styles stay owned by `other`, which destroys them when it is cleared or
+  // destroyed; GetStyleName and RemoveStyle(Style*) still know them, but
+  // GetStyle and the lists no longer do.
   void MergeIn(StyleSheet& other, bool replace);
 
   // Queries; styles returned stay owned by the sheet.
@@ -133,7 +160,8 @@ public:
   ZelStringT<char16_t> GetUnusedStyleName(const ZelStringT<char16_t>& proposed) const;
   // Makes this sheet a deep copy of `source` by way of its JSON text, tells
   // `context` (not owned; may be null) about every new style and takes the
-  // source's version.
+  // source's version. This sheet's styles are destroyed first, all of them
+  // (as by Clear), so none is left pointing at another.
   void CopyContentsFrom(const StyleSheet& source, IStyleSheetDuplicationContext* context);
 
   // Writes the document text (without temporary properties) as UTF-8; false
@@ -144,16 +172,30 @@ public:
   bool Import(ZelUtils::Stream& stream, bool replace);
 
 private:
-  // AddStyle with one search of the name index; `previous` receives what
-  // AddStyle returns. Returns the entry now filed under `name`.
-  NameIndex::iterator FileStyle(const ZelStringT<char16_t>& name, Style* style, bool replace,
-                                Style*& previous);
-  // Detaches the style filed under the name that `entry` records; null when
-  // the name index lacks that name.
+  friend class Style;
+
+  // Files `style` under `name` with one search of the name index. `previous`
+  // receives the style replaced (detached, not destroyed). Returns the entry
+  // filed under `name` and whether `style` went in; when it did not (a clash
+  // without `replace`), `style` is still the caller's to destroy.
+  std::pair<NameIndex::iterator, bool> FileStyle(const ZelStringT<char16_t>& name, Style* style,
+                                                 bool replace, Style*& previous);
+  // Detaches the style that `entry` records, from both indexes.
   Style* DetachByPointerEntry(PointerIndex::iterator entry);
+  // Makes every style of the sheet that refers to an old style of `heirs`
+  // (styles no longer in the sheet) refer to its heir instead; a style that
+  // an heir is or inherits from, or every one when an heir is null, takes
+  // over the old style's values instead.
+  void Redirect(const std::map<Style*, Style*>& heirs);
+  // Whether `child` may inherit from `parent`: false when `child` is `parent`
+  // or one of its ancestors. During an import the answer takes amortised
+  // logarithmic time and the new link is recorded.
+  bool AcceptParent(Style& child, Style& parent) const;
 
   std::unique_ptr<NameIndex> m_styles;
   std::unique_ptr<PointerIndex> m_names;
+  // The parent links of the import under way, or null.
+  mutable detail::ParentForest* m_import = nullptr;
   int m_version;
   ZelStringT<char16_t> m_externalID;
 };
