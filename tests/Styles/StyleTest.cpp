@@ -44,7 +44,6 @@ TEST(PropertyKeyTest, OrderIsEntryIdentityNotText) {
   EXPECT_FALSE(keys[0] < keys[0]);
 }
 
-using testing::HostSubstyleProperty;
 using testing::Number;
 using testing::ScopedCategory;
 using ZelUtils::Any;
@@ -56,10 +55,10 @@ protected:
   StyleTest() : corner(u"StyleTest.Corner"), border(u"StyleTest.Border"), para(u"StyleTest.Para") {
     radius = corner.Number(u"radius", 1.0);
     width = border.Number(u"width", 0.5);
-    cornerKey = border.Add(u"corner", new HostSubstyleProperty(corner.Key()));
+    cornerKey = border.Add(u"corner", new StyleSetProperty(corner.Key()));
     size = para.Number(u"size", 10.0);
     indent = para.Number(u"indent", 0.0);
-    borderKey = para.Add(u"border", new HostSubstyleProperty(border.Key()));
+    borderKey = para.Add(u"border", new StyleSetProperty(border.Key()));
   }
 
   Style* Para(Style* parent = nullptr) {
@@ -127,10 +126,10 @@ TEST_F(StyleTest, UnregisteredKeysAreNeverStoredAndThrowFromOneLookup) {
 }
 
 TEST_F(StyleTest, SettingClearingAndSelfAssignmentDestroyOldValuesOnce) {
-  int destroyed = 0;
+  testing::ValueCounts counts;
+  int& destroyed = counts.destroyed;
   ScopedCategory counting(u"StyleTest.Counting");
-  const PropertyKey count =
-      counting.Add(u"count", new testing::CountingNumberProperty(0, &destroyed));
+  const PropertyKey count = counting.Add(u"count", new testing::CountingNumberProperty(0, &counts));
   Style style(nullptr, counting.Key());
 
   style.SetProperty(count, Any(1.0));
@@ -278,7 +277,7 @@ TEST_F(StyleTest, OwnerBasedInheritanceThreeLevelsDeep) {
   // A category whose substyle holds a paragraph, so the chain can go deeper
   // than the two keys kept without allocating.
   ScopedCategory outer(u"StyleTest.Outer");
-  const PropertyKey paraKey = outer.Add(u"para", new HostSubstyleProperty(para.Key()));
+  const PropertyKey paraKey = outer.Add(u"para", new StyleSetProperty(para.Key()));
   Style p(nullptr, outer.Key());
   p.SetPathProperty({paraKey, borderKey, cornerKey, radius}, Any(6.0));
   Style a(&p, outer.Key());
@@ -416,7 +415,7 @@ TEST_F(StyleTest, SetPathPropertyFromSourceCopiesOnlyOwnValues) {
 
 TEST_F(StyleTest, ExternalIdReachesDirectSubstylesOfOrdinaryStylesOnly) {
   ScopedCategory ordinary(u"style");
-  const PropertyKey paraKey = ordinary.Add(u"StyleTest.para", new HostSubstyleProperty(para.Key()));
+  const PropertyKey paraKey = ordinary.Add(u"StyleTest.para", new StyleSetProperty(para.Key()));
   Style style(nullptr, StyleCategoryName);
   style.SetPathProperty({paraKey, borderKey, width}, Any(1.0));
   style.SetExternalID(u"E1");

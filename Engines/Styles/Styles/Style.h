@@ -295,6 +295,9 @@ public:
                             const PropertyKey& category);
 
 private:
+  // Adopts deserialized substyles into the property map without copying.
+  friend class StyleSetProperty;
+
   // The behaviour of `key` in this style's category, or null.
   BaseStyleProperty* FindBehaviour(const PropertyKey& key) const;
   void DestroyOwnValues();
