@@ -1,5 +1,6 @@
 // Behaviours a host would write, for tests: a plain number property that
-// counts the values it stores and destroys, and a scoped category.
+// counts the values it stores and destroys, a scoped category, and a check of
+// the owner links of a tree of substyles.
 #pragma once
 
 #include <Styles/Style.h>
@@ -11,9 +12,12 @@
 #include <Json/Json.h>
 #include <ZelPref/ConversionPolicy.h>
 
+#include <gtest/gtest.h>
+
 #include <memory>
 #include <string>
 #include <utility>
+#include <vector>
 
 namespace Styles {
 namespace testing {
@@ -73,6 +77,25 @@ private:
 };
 
 inline double Number(const ZelUtils::Any& value) { return value.Get<double>(); }
+
+// Checks that every single substyle below `style` names its holder and key as
+// owner, while list elements have none; returns how many substyles it saw.
+inline int CheckOwnerLinks(const Style& style) {
+  int seen = 0;
+  for (const auto& [key, value] : style.GetProperties()) {
+    if (Style* const* substyle = value.GetIf<Style*>(); substyle && *substyle) {
+      EXPECT_EQ((*substyle)->GetOwner(), &style);
+      EXPECT_EQ((*substyle)->GetOwnerPropertyKey(), key);
+      seen += 1 + CheckOwnerLinks(**substyle);
+    } else if (const auto* list = value.GetIf<std::vector<Style*>>()) {
+      for (const Style* element : *list) {
+        EXPECT_EQ(element->GetOwner(), nullptr);
+        seen += 1 + CheckOwnerLinks(*element);
+      }
+    }
+  }
+  return seen;
+}
 
 } // namespace testing
 } // namespace Styles

@@ -44,6 +44,7 @@ TEST(PropertyKeyTest, OrderIsEntryIdentityNotText) {
   EXPECT_FALSE(keys[0] < keys[0]);
 }
 
+using testing::CheckOwnerLinks;
 using testing::Number;
 using testing::ScopedCategory;
 using ZelUtils::Any;
@@ -639,25 +640,6 @@ protected:
       style = style->GetSubstyle(child, false);
     return const_cast<Style*>(style);
   }
-  // Checks that every single substyle below `style` names its holder and key
-  // as owner, while list elements have none; returns how many substyles it saw.
-  static int CheckOwners(const Style& style) {
-    int seen = 0;
-    for (const auto& [key, value] : style.GetProperties()) {
-      if (Style* const* substyle = value.GetIf<Style*>(); substyle && *substyle) {
-        EXPECT_EQ((*substyle)->GetOwner(), &style);
-        EXPECT_EQ((*substyle)->GetOwnerPropertyKey(), key);
-        seen += 1 + CheckOwners(**substyle);
-      } else if (const List* list = value.GetIf<List>()) {
-        for (const Style* element : *list) {
-          EXPECT_EQ(element->GetOwner(), nullptr);
-          seen += 1 + CheckOwners(*element);
-        }
-      }
-    }
-    return seen;
-  }
-
   testing::ValueCounts counts;
   ScopedCategory node;
   PropertyKey mark, child, items;
@@ -729,13 +711,13 @@ TEST_F(StyleTreeTest, OwnerLinksSurviveEveryOperationThatMovesSubstyles) {
     SCOPED_TRACE(c.label);
     const int live = counts.Live();
     std::unique_ptr<Style> result = c.make();
-    EXPECT_EQ(CheckOwners(*result), 9);
+    EXPECT_EQ(CheckOwnerLinks(*result), 9);
     EXPECT_EQ(Number(Deep(*result, 5)->GetProperty(mark)), 5.0);
     EXPECT_EQ(counts.Live(), live + 10);
     result.reset();
     EXPECT_EQ(counts.Live(), live);
   }
-  EXPECT_EQ(CheckOwners(*tree), 9);
+  EXPECT_EQ(CheckOwnerLinks(*tree), 9);
 }
 
 TEST_F(StyleTreeTest, RevertKeepsSingleSubstylesAndClearKeepsIdentity) {
@@ -745,7 +727,7 @@ TEST_F(StyleTreeTest, RevertKeepsSingleSubstylesAndClearKeepsIdentity) {
   Style* deepest = Deep(*style, 5);
   EXPECT_TRUE(style->RevertAllProperties());
   // The chain stays, emptied; the list and every mark are gone.
-  EXPECT_EQ(CheckOwners(*style), 5);
+  EXPECT_EQ(CheckOwnerLinks(*style), 5);
   EXPECT_EQ(Deep(*style, 5), deepest);
   EXPECT_TRUE(style->IsEmptyWithEmptySubstyles());
   EXPECT_EQ(counts.Live(), 10);
