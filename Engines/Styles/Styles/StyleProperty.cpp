@@ -193,8 +193,6 @@ bool StyleProperty::CheckType(const ZelUtils::Any& value) const {
   return m_typeCheck && m_typeCheck(value);
 }
 
-// StyleSetProperty
-
 namespace {
 
 // The substyle of a single-substyle value; std::bad_cast unless it holds Style*.
@@ -206,6 +204,8 @@ const std::vector<Style*>& HeldList(const ZelUtils::Any& value) {
 }
 
 } // namespace
+
+// StyleSetProperty
 
 StyleSetProperty::StyleSetProperty(const PropertyKey& elementCategory)
     : BaseStyleProperty(ZelUtils::Any(static_cast<Style*>(nullptr))),

@@ -22,8 +22,8 @@ STYLES_API extern const PropertyKey StyleCategoryName;
 STYLES_API void RegisterSubstyleSet(const PropertyKey& categoryKey, const PropertyKey& propertyKey);
 // Registers the category of ordinary styles (StyleCategoryName) with
 // `uiName`, giving it one substyle property per category registered before
-// with addToStyleCategory, keyed by that category's key. Call once, after
-// those categories.
+// with addToStyleCategory, keyed by that category's key. Meant to run once,
+// after those categories; a later call adds only the keys still missing.
 STYLES_API void RegisterStyleCategory(const ZelStringT<char16_t>& uiName);
 
 // A path of keys from the outermost style to a property; every key but the
