@@ -1,9 +1,12 @@
 // Import and export throughput of a style sheet document, next to the raw
 // RapidJSON parse and write of the same text as the floor to compare with.
-// Sizes are numbers of styles; bytes are UTF-16 code units times two.
+// Sizes are numbers of styles; bytes are UTF-16 code units times two. Each
+// size runs on a plain document and on one where a fifth of the styles own a
+// substyle and a twentieth a list of two to four substyles.
 #include <Styles/StyleManager.h>
 #include <Styles/StyleProperty.h>
 #include <Styles/StyleSheet.h>
+#include <Styles/StyleUtilities.h>
 
 #include <ZelPref/ConversionPolicy.h>
 
@@ -16,6 +19,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <vector>
 
 namespace {
 
@@ -31,6 +35,7 @@ const PropertyKey kSize(u"fontSize");
 const PropertyKey kFont(u"fontName");
 const PropertyKey kColour(u"colour");
 const PropertyKey kSpacing(u"spaceAfter");
+const PropertyKey kRuns(u"runs");
 
 bool IsNumber(const ZelUtils::Any& value) { return value.GetIf<double>() != nullptr; }
 bool IsText(const ZelUtils::Any& value) { return value.GetIf<Text>() != nullptr; }
@@ -52,14 +57,19 @@ void RegisterCategories() {
                                  new Styles::StyleProperty(ZelUtils::Any(Text()),
                                                            new ZelPref::TextConversionPolicy,
                                                            &IsText));
+      // One character substyle (keyed by its category) and a list of them.
+      Styles::RegisterSubstyleSet(category, kCharacter);
+      manager.RegisterProperty(category, kRuns, new Styles::StyleArrayProperty(kCharacter));
     }
     return true;
   }();
   (void)registered;
 }
 
-// A sheet of `count` styles in chains of ten, alternating categories.
-std::unique_ptr<StyleSheet> MakeSheet(std::int64_t count) {
+// A sheet of `count` styles in chains of ten, alternating categories. With
+// `substyles`, every fifth style owns a character substyle and every
+// twentieth a list of two to four of them.
+std::unique_ptr<StyleSheet> MakeSheet(std::int64_t count, bool substyles) {
   RegisterCategories();
   auto sheet = std::make_unique<StyleSheet>();
   Style* previous = nullptr;
@@ -70,6 +80,17 @@ std::unique_ptr<StyleSheet> MakeSheet(std::int64_t count) {
     style->SetProperty(kFont, Text(u"Garamond Premier Pro"));
     if (i % 3 == 0)
       style->SetProperty(kColour, Text(u"#1f3a5c"));
+    if (substyles && i % 5 == 0) {
+      style->SetPathProperty({kCharacter, kSize}, ZelUtils::Any(9.5));
+      style->SetPathProperty({kCharacter, kFont}, ZelUtils::Any(Text(u"Minion Pro")));
+    }
+    if (substyles && i % 20 == 1) {
+      Style run(nullptr, kCharacter);
+      run.SetProperty(kColour, Text(u"#8b0000"));
+      run.SetProperty(kSize, 7.0);
+      // The style stores copies of the list's substyles.
+      style->SetProperty(kRuns, std::vector<Style*>(2 + static_cast<std::size_t>(i % 3), &run));
+    }
     sheet->AddStyle(Text::FormatInternal("Style number %lld", static_cast<long long>(i)), style,
                     false);
     previous = style;
@@ -77,9 +98,9 @@ std::unique_ptr<StyleSheet> MakeSheet(std::int64_t count) {
   return sheet;
 }
 
-Text MakeText(std::int64_t count) {
+Text MakeText(std::int64_t count, bool substyles) {
   Text text;
-  MakeSheet(count)->ExportToString(text, false);
+  MakeSheet(count, substyles)->ExportToString(text, false);
   return text;
 }
 
@@ -89,7 +110,7 @@ void Report(benchmark::State& state, const Text& text) {
 }
 
 void BM_ExportSheet(benchmark::State& state) {
-  const std::unique_ptr<StyleSheet> sheet = MakeSheet(state.range(0));
+  const std::unique_ptr<StyleSheet> sheet = MakeSheet(state.range(0), state.range(1) != 0);
   Text text;
   for (auto _ : state) {
     sheet->ExportToString(text, false);
@@ -100,7 +121,7 @@ void BM_ExportSheet(benchmark::State& state) {
 
 // Includes destroying the imported styles, which every real import pays for.
 void BM_ImportSheet(benchmark::State& state) {
-  const Text text = MakeText(state.range(0));
+  const Text text = MakeText(state.range(0), state.range(1) != 0);
   for (auto _ : state) {
     StyleSheet sheet;
     const bool imported = sheet.ImportFromString(text, true);
@@ -110,7 +131,7 @@ void BM_ImportSheet(benchmark::State& state) {
 }
 
 void BM_RawRapidJsonParse(benchmark::State& state) {
-  const Text text = MakeText(state.range(0));
+  const Text text = MakeText(state.range(0), state.range(1) != 0);
   for (auto _ : state) {
     rapidjson::GenericReader<Utf16, Utf16> reader;
     rapidjson::GenericStringStream<Utf16> stream(text.c_str());
@@ -122,7 +143,7 @@ void BM_RawRapidJsonParse(benchmark::State& state) {
 }
 
 void BM_RawRapidJsonWrite(benchmark::State& state) {
-  const Text text = MakeText(state.range(0));
+  const Text text = MakeText(state.range(0), state.range(1) != 0);
   rapidjson::GenericDocument<Utf16> document;
   document.Parse(text.c_str());
   for (auto _ : state) {
@@ -134,15 +155,16 @@ void BM_RawRapidJsonWrite(benchmark::State& state) {
   Report(state, text);
 }
 
+// Sizes 100 to 10,000 styles, each without and with substyles.
+void SheetSizes(benchmark::internal::Benchmark* family) {
+  family->ArgsProduct({benchmark::CreateRange(100, 10000, 10), {0, 1}})
+      ->ArgNames({"styles", "substyles"})
+      ->Unit(benchmark::kMillisecond);
+}
+
 } // namespace
 
-BENCHMARK(BM_ExportSheet)->RangeMultiplier(10)->Range(100, 10000)->Unit(benchmark::kMillisecond);
-BENCHMARK(BM_ImportSheet)->RangeMultiplier(10)->Range(100, 10000)->Unit(benchmark::kMillisecond);
-BENCHMARK(BM_RawRapidJsonParse)
-    ->RangeMultiplier(10)
-    ->Range(100, 10000)
-    ->Unit(benchmark::kMillisecond);
-BENCHMARK(BM_RawRapidJsonWrite)
-    ->RangeMultiplier(10)
-    ->Range(100, 10000)
-    ->Unit(benchmark::kMillisecond);
+BENCHMARK(BM_ExportSheet)->Apply(SheetSizes);
+BENCHMARK(BM_ImportSheet)->Apply(SheetSizes);
+BENCHMARK(BM_RawRapidJsonParse)->Apply(SheetSizes);
+BENCHMARK(BM_RawRapidJsonWrite)->Apply(SheetSizes);

@@ -1,6 +1,6 @@
 // Behaviours a host would write, for tests: a plain number property that
-// counts how often its values are destroyed, and a property that owns one
-// substyle the way a host's substyle property would.
+// counts the values it stores and destroys, a scoped category, and a check of
+// the owner links of a tree of substyles.
 #pragma once
 
 #include <Styles/Style.h>
@@ -12,88 +12,42 @@
 #include <Json/Json.h>
 #include <ZelPref/ConversionPolicy.h>
 
+#include <gtest/gtest.h>
+
 #include <memory>
 #include <string>
+#include <utility>
+#include <vector>
 
 namespace Styles {
 namespace testing {
 
 inline bool IsNumber(const ZelUtils::Any& value) { return value.IsTypeCompatible<double>(); }
 
-// A number property whose DestroyPropertyData calls are counted.
-class CountingNumberProperty : public StyleProperty {
-public:
-  CountingNumberProperty(double defaultValue, int* destroyed)
-      : StyleProperty(ZelUtils::Any(defaultValue), new ZelPref::NumberConversionPolicy(),
-                      &IsNumber),
-        m_destroyed(destroyed) {}
-  void DestroyPropertyData(const ZelUtils::Any&) const override { ++*m_destroyed; }
-
-private:
-  int* m_destroyed;
+// How many values of one counting property were stored and destroyed.
+struct ValueCounts {
+  int stored = 0;
+  int destroyed = 0;
+  int Live() const { return stored - destroyed; }
 };
 
-// Owns one substyle of `element`: stores copies, deletes them, keeps owner
-// links and compares substyles by content.
-class HostSubstyleProperty : public BaseStyleProperty {
+// A number property that counts every value it stores (set, read or copied
+// into a style) and destroys. A test that gives each of its styles one such
+// value sees how many of them were made and freed.
+class CountingNumberProperty : public StyleProperty {
 public:
-  explicit HostSubstyleProperty(const PropertyKey& element)
-      : BaseStyleProperty(ZelUtils::Any(static_cast<Style*>(nullptr))), m_element(element) {}
-
-  PropertyKey GetElementCategoryName() const override { return m_element; }
-  bool Serialize(const StyleSheet&, const Style*, const ZelUtils::Any&, JsonValue&) const override {
-    return false;
-  }
-  bool Deserialize(const StyleSheet&, Style*, const JsonValue&) const override { return false; }
-  void DestroyPropertyData(const ZelUtils::Any& value) const override {
-    delete value.Get<Style*>();
-  }
+  CountingNumberProperty(double defaultValue, ValueCounts* counts)
+      : StyleProperty(ZelUtils::Any(defaultValue), new ZelPref::NumberConversionPolicy(),
+                      &IsNumber),
+        m_counts(counts) {}
   ZelUtils::Any MovePropertyData(Style* owner, ZelUtils::Any&& value) const override {
-    const Style* source =
-        value.IsTypeCompatible<Style*>() ? value.Get<Style*>() : value.Get<const Style*>();
-    if (!source)
-      return ZelUtils::Any();
-    Style* copy = new Style(*source);
-    copy->SetOwner(owner, GetName());
-    return ZelUtils::Any(copy);
+    m_counts->stored += value.IsEmpty() ? 0 : 1;
+    return StyleProperty::MovePropertyData(owner, std::move(value));
   }
-  void SetOwner(ZelUtils::Any& value, Style* owner, const PropertyKey& key) const override {
-    if (Style* substyle = value.Get<Style*>())
-      substyle->SetOwner(owner, key);
-  }
-  // A substyle the target holds itself is merged into; otherwise copied.
-  void MergeProperty(Style* target, const Style* source, const PropertyKey& key,
-                     bool overwrite) const override {
-    const Style* sourceSubstyle = source->GetSubstyle(key, false);
-    if (Style* own = target->GetSubstyle(key, false))
-      own->MergeProperties(sourceSubstyle, overwrite);
-    else
-      target->SetProperty(key, ZelUtils::Any(sourceSubstyle));
-  }
-  void MergeParentProperty(Style* target, const Style* parent,
-                           const PropertyKey& key) const override {
-    const Style* parentSubstyle = parent->GetSubstyle(key, false);
-    if (Style* own = target->GetSubstyle(key, false)) {
-      if (!own->GetParent()) {
-        own->MergeParentProperties(parentSubstyle);
-        own->SetParent(parentSubstyle->GetParent());
-      }
-    } else {
-      target->SetProperty(key, ZelUtils::Any(parentSubstyle));
-    }
-  }
-  bool IsEqual(const ZelUtils::Any& a, const ZelUtils::Any& b) const override {
-    const Style* x = a.Get<Style*>();
-    const Style* y = b.Get<Style*>();
-    return x == y || (x && y && *x == *y);
-  }
-  bool IsSubstyle() const override { return true; }
-  bool CheckType(const ZelUtils::Any& value) const override {
-    return value.IsTypeCompatible<const Style*>();
-  }
+  void DestroyPropertyData(const ZelUtils::Any&) const override { ++m_counts->destroyed; }
 
 private:
-  PropertyKey m_element;
+  ValueCounts* m_counts;
 };
 
 // Registers a category under a key unique to the test and removes it again.
@@ -123,6 +77,25 @@ private:
 };
 
 inline double Number(const ZelUtils::Any& value) { return value.Get<double>(); }
+
+// Checks that every single substyle below `style` names its holder and key as
+// owner, while list elements have none; returns how many substyles it saw.
+inline int CheckOwnerLinks(const Style& style) {
+  int seen = 0;
+  for (const auto& [key, value] : style.GetProperties()) {
+    if (Style* const* substyle = value.GetIf<Style*>(); substyle && *substyle) {
+      EXPECT_EQ((*substyle)->GetOwner(), &style);
+      EXPECT_EQ((*substyle)->GetOwnerPropertyKey(), key);
+      seen += 1 + CheckOwnerLinks(**substyle);
+    } else if (const auto* list = value.GetIf<std::vector<Style*>>()) {
+      for (const Style* element : *list) {
+        EXPECT_EQ(element->GetOwner(), nullptr);
+        seen += 1 + CheckOwnerLinks(*element);
+      }
+    }
+  }
+  return seen;
+}
 
 } // namespace testing
 } // namespace Styles

@@ -1,5 +1,7 @@
 #include <Styles/StyleProperty.h>
 
+#include "HostBehaviours.h"
+
 #include <Styles/StyleManager.h>
 #include <Styles/StyleSheet.h>
 
@@ -9,7 +11,9 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <memory>
 #include <string>
+#include <vector>
 
 namespace Styles {
 namespace {
@@ -64,7 +68,7 @@ TEST(StylePropertyTest, SerializeRespectsMinimumVersion) {
        {Case{2, &withPolicy, false, untouched}, Case{3, &withPolicy, true, JsonValue(u"v")},
         Case{4, &withPolicy, true, JsonValue(u"v")}, Case{2, &withoutPolicy, false, untouched},
         Case{3, &withoutPolicy, true, JsonValue()}}) {
-    SCOPED_TRACE(testing::Message()
+    SCOPED_TRACE(::testing::Message()
                  << "version " << c.version << ", policy " << (c.property == &withPolicy));
     StyleSheet sheet;
     sheet.SetVersion(c.version);
@@ -75,7 +79,7 @@ TEST(StylePropertyTest, SerializeRespectsMinimumVersion) {
 }
 
 // Behaviours registered in the shared manager under keys of this suite.
-class StylePropertyStyleTest : public testing::Test {
+class StylePropertyStyleTest : public ::testing::Test {
 protected:
   void SetUp() override {
     GetStyleManager().RegisterCategory(m_category, u"PropertyTest", false, false);
@@ -202,6 +206,250 @@ TEST_F(StylePropertyStyleTest, FlattenPropertyMakesInheritedValuesOwn) {
   Style alone(nullptr, m_category); // only the default: nothing to flatten
   EXPECT_FALSE(width->FlattenProperty(&alone, m_width));
   EXPECT_FALSE(alone.DoesOverrideProperty(m_width));
+}
+
+// Nodes carry a counted mark and hold a child node (one substyle) and a list
+// of item nodes (an array of the holder's own category).
+class SubstylePropertyTest : public ::testing::Test {
+protected:
+  using List = std::vector<Style*>;
+
+  SubstylePropertyTest() : node(u"PropertyTest.Node") {
+    sheet.SetVersion(1);
+    mark = node.Add(u"mark", new testing::CountingNumberProperty(0, &counts));
+    child = node.Add(u"child", new StyleSetProperty(node.Key()));
+    items = node.Add(u"items", new StyleArrayProperty(PropertyKey::Empty));
+  }
+  ~SubstylePropertyTest() override { EXPECT_EQ(counts.Live(), 0); }
+
+  // A free node marked `value`; the caller owns it.
+  std::unique_ptr<Style> Node(double value, Style* parent = nullptr) {
+    auto style = std::make_unique<Style>(parent, node.Key());
+    style->SetProperty(mark, Any(value));
+    return style;
+  }
+  const BaseStyleProperty& Behaviour(const PropertyKey& key) const {
+    return *GetStyleManager().GetStyleProperty(node.Key(), key);
+  }
+  double Mark(const Style* style) const { return style->GetProperty(mark).Get<double>(); }
+  static JsonValue Parse(const char16_t* text) {
+    JsonValue value;
+    Text error;
+    EXPECT_TRUE(Json::Parse(text, value, error));
+    return value;
+  }
+  const List& Items(const Style& style) const { return style.GetProperty(items).Get<List>(); }
+
+  testing::ValueCounts counts;
+  testing::ScopedCategory node;
+  PropertyKey mark, child, items;
+  StyleSheet sheet;
+};
+
+TEST_F(SubstylePropertyTest, ComparesSubstylesByContentAndListsByLengthFirst) {
+  const std::unique_ptr<Style> one = Node(1), alsoOne = Node(1), two = Node(2);
+  Style* const a = one.get();
+  Style* const b = alsoOne.get();
+  Style* const c = two.get();
+  Style* const none = nullptr;
+  struct Case {
+    const char* label;
+    List x, y;
+    bool equal, less;
+  };
+  // Single substyles go through one-element rows; nulls order first.
+  for (const Case& row :
+       {Case{"null, null", {none}, {none}, true, false},
+        Case{"null, style", {none}, {a}, false, true},
+        Case{"style, null", {a}, {none}, false, false},
+        Case{"equal content", {a}, {b}, true, false}, Case{"1 before 2", {a}, {c}, false, true},
+        Case{"2 after 1", {c}, {a}, false, false}}) {
+    SCOPED_TRACE(row.label);
+    const BaseStyleProperty& set = Behaviour(child);
+    EXPECT_EQ(set.IsEqual(Any(row.x[0]), Any(row.y[0])), row.equal);
+    EXPECT_EQ(set.IsLess(Any(row.x[0]), Any(row.y[0])), row.less);
+    const BaseStyleProperty& array = Behaviour(items);
+    EXPECT_EQ(array.IsEqual(Any(row.x), Any(row.y)), row.equal);
+    EXPECT_EQ(array.IsLess(Any(row.x), Any(row.y)), row.less);
+  }
+  for (const Case& row : {Case{"empty lists", {}, {}, true, false},
+                          Case{"shorter first, whatever it holds", {c}, {a, a}, false, true},
+                          Case{"longer after", {a, a}, {c}, false, false},
+                          Case{"nulls in place", {a, none}, {b, none}, true, false}}) {
+    SCOPED_TRACE(row.label);
+    EXPECT_EQ(Behaviour(items).IsEqual(Any(row.x), Any(row.y)), row.equal);
+    EXPECT_EQ(Behaviour(items).IsLess(Any(row.x), Any(row.y)), row.less);
+  }
+  EXPECT_THROW(Behaviour(child).IsEqual(Any(1.0), Any(1.0)), std::bad_cast);
+  EXPECT_THROW(Behaviour(items).IsLess(Any(a), Any(a)), std::bad_cast);
+}
+
+TEST_F(SubstylePropertyTest, StoresCopiesOwnedByTheHolder) {
+  EXPECT_TRUE(Behaviour(child).IsSubstyle());
+  EXPECT_FALSE(Behaviour(items).IsSubstyle());
+  EXPECT_TRUE(Behaviour(child).CheckType(Any(static_cast<const Style*>(nullptr))));
+  EXPECT_FALSE(Behaviour(items).CheckType(Any(static_cast<Style*>(nullptr))));
+
+  const std::unique_ptr<Style> source = Node(1);
+  source->SetPathProperty({child, mark}, Any(2.0));
+  const std::unique_ptr<Style> holder = Node(0);
+  holder->SetProperty(child, Any(static_cast<const Style*>(source.get())));
+  holder->SetProperty(items, List{source.get(), nullptr, source.get()});
+  EXPECT_EQ(counts.Live(), 2 + 1 + 2 + 2 * 2); // source, holder, copied child, two copied items
+
+  Style* copy = holder->GetSubstyle(child, false);
+  ASSERT_NE(copy, source.get());
+  EXPECT_EQ(copy->GetOwner(), holder.get());
+  EXPECT_EQ(copy->GetOwnerPropertyKey(), child);
+  EXPECT_EQ(copy->GetSubstyle(child, false)->GetOwner(), copy);
+  EXPECT_EQ(source->GetOwner(), nullptr);
+  const List& list = Items(*holder);
+  ASSERT_EQ(list.size(), 3u);
+  EXPECT_EQ(list[1], nullptr);
+  EXPECT_NE(list[0], list[2]);
+  EXPECT_EQ(list[0]->GetOwner(), nullptr); // array elements get no owner link
+  EXPECT_EQ(list[0]->GetSubstyle(child, false)->GetOwner(), list[0]);
+
+  // Null elements are passed to style visitors but skipped by value visitors.
+  int styles = 0, values = 0;
+  EXPECT_TRUE(Behaviour(items).ProcessStylesInProperty(holder->GetProperty(items),
+                                                       [&](Style*) { return ++styles > 0; }));
+  EXPECT_EQ(styles, 3);
+  Any value = holder->GetProperty(items);
+  EXPECT_TRUE(Behaviour(items).ProcessProperty(
+      value, [&](Any&, Style*, const PropertyKey&) { return ++values > 0; }, holder.get(), items));
+  EXPECT_EQ(values, 2 * 2);
+  Style* seen = source.get();
+  EXPECT_FALSE(Behaviour(child).ProcessStylesInProperty(Any(static_cast<Style*>(nullptr)),
+                                                        [&](Style* s) { return (seen = s); }));
+  EXPECT_EQ(seen, nullptr);
+}
+
+TEST_F(SubstylePropertyTest, JsonFormsAndDamagedInput) {
+  const std::unique_ptr<Style> holder = Node(0);
+  JsonValue out(u"untouched");
+  EXPECT_TRUE(
+      Behaviour(child).Serialize(sheet, holder.get(), Any(static_cast<Style*>(nullptr)), out));
+  EXPECT_TRUE(out.IsNull());
+  const std::unique_ptr<Style> element = Node(4);
+  EXPECT_TRUE(
+      Behaviour(items).Serialize(sheet, holder.get(), Any(List{nullptr, element.get()}), out));
+  EXPECT_EQ(Json::ValueToString(out, false), Text(u"[{\"mark\":\"4\"}]"));
+
+  // A substyle member must be an object; a repeated one keeps the first.
+  for (const char16_t* text : {u"null", u"3", u"[{}]", u"\"x\""})
+    EXPECT_FALSE(Behaviour(child).Deserialize(sheet, holder.get(), Parse(text)));
+  EXPECT_FALSE(holder->DoesOverrideProperty(child));
+  EXPECT_TRUE(Behaviour(child).Deserialize(sheet, holder.get(), Parse(u"{\"mark\":\"5\"}")));
+  EXPECT_TRUE(Behaviour(child).Deserialize(sheet, holder.get(), Parse(u"{\"mark\":\"6\"}")));
+  const Style* read = holder->GetSubstyle(child, false);
+  EXPECT_EQ(Mark(read), 5.0);
+  EXPECT_EQ(read->GetOwner(), holder.get());
+  EXPECT_EQ(counts.Live(), 3);
+
+  // Array members other than objects are dropped; the read substyles are
+  // stored as copies and freed.
+  EXPECT_FALSE(Behaviour(items).Deserialize(sheet, holder.get(), Parse(u"{}")));
+  EXPECT_TRUE(Behaviour(items).Deserialize(
+      sheet, holder.get(), Parse(u"[1, \"x\", null, {\"mark\":\"7\"}, [], {}, true]")));
+  const List& list = Items(*holder);
+  ASSERT_EQ(list.size(), 2u);
+  EXPECT_EQ(Mark(list[0]), 7.0);
+  EXPECT_EQ(list[1]->GetCategoryName(), node.Key());
+  EXPECT_EQ(counts.Live(), 4);
+  EXPECT_TRUE(Behaviour(items).Deserialize(sheet, holder.get(), Parse(u"[]")));
+  EXPECT_TRUE(Items(*holder).empty());
+}
+
+TEST_F(SubstylePropertyTest, DependenciesOfSubstylesAndOfListsDiffer) {
+  const std::unique_ptr<Style> p1 = Node(1), p2 = Node(2);
+  const std::unique_ptr<Style> holder = Node(0);
+  holder->SetProperty(child, Any(static_cast<const Style*>(Node(3, p1.get()).get())));
+  holder->SetProperty(items, List{nullptr, Node(4, p2.get()).get()});
+  Style* sub = holder->GetSubstyle(child, false);
+  Style* element = Items(*holder)[1];
+  const Any& set = holder->GetProperty(child);
+  const Any& array = holder->GetProperty(items);
+  const List onlyP1{p1.get()}, onlyP2{p2.get()}, onlySub{sub}, onlyElement{element};
+
+  // parentOnly: the single substyle reports its parent, the list its
+  // substyles themselves, while the list's HasDependency asks about parents.
+  EXPECT_EQ(Behaviour(child).GetDependencies(set, StyleSpan(onlyP1, true), true), onlyP1);
+  EXPECT_TRUE(Behaviour(child).HasDependency(set, StyleSpan(onlyP1, true), true));
+  EXPECT_TRUE(Behaviour(child).GetDependencies(set, StyleSpan(onlySub, true), true).empty());
+  EXPECT_TRUE(Behaviour(items).GetDependencies(array, StyleSpan(onlyP2, false), true).empty());
+  EXPECT_TRUE(Behaviour(items).HasDependency(array, StyleSpan(onlyP2, false), true));
+  EXPECT_EQ(Behaviour(items).GetDependencies(array, StyleSpan(onlyElement, false), true),
+            onlyElement);
+  EXPECT_FALSE(Behaviour(items).HasDependency(array, StyleSpan(onlyElement, false), true));
+  // Without parentOnly both look through the substyles.
+  EXPECT_EQ(Behaviour(items).GetDependencies(array, StyleSpan(onlyP2, false), false), onlyP2);
+  EXPECT_TRUE(Behaviour(child).HasDependency(set, StyleSpan(onlySub, false), false));
+  EXPECT_TRUE(Behaviour(items).HasParentalDependency(array));
+
+  // Deleting P2 bakes its values into the element that inherited them.
+  p2->SetProperty(child, Any(static_cast<const Style*>(Node(9).get())));
+  holder->RemoveDependency(StyleSpan(onlyP2, false), true);
+  EXPECT_EQ(element->GetParent(), nullptr);
+  EXPECT_EQ(Mark(element->GetSubstyle(child, false)), 9.0);
+  EXPECT_EQ(element->GetSubstyle(child, false)->GetOwner(), element);
+}
+
+TEST_F(SubstylePropertyTest, MergeNeverReplacesAnOwnSubstyle) {
+  const std::unique_ptr<Style> source = Node(0);
+  source->SetPathProperty({child, mark}, Any(2.0));
+  const std::unique_ptr<Style> target = Node(0);
+  target->SetPathProperty({child, mark}, Any(1.0));
+  Style* own = target->GetSubstyle(child, false);
+
+  Behaviour(child).MergeProperty(target.get(), source.get(), child, false);
+  EXPECT_EQ(Mark(own), 1.0);
+  Behaviour(child).MergeProperty(target.get(), source.get(), child, true);
+  EXPECT_EQ(target->GetSubstyle(child, false), own);
+  EXPECT_EQ(Mark(own), 2.0);
+
+  const std::unique_ptr<Style> empty = Node(0);
+  Behaviour(child).MergeProperty(empty.get(), source.get(), child, false);
+  EXPECT_EQ(empty->GetSubstyle(child, false)->GetOwner(), empty.get());
+
+  // From a parent: a parentless own substyle takes over the parent's
+  // substyle and that substyle's parent.
+  const std::unique_ptr<Style> base = Node(5);
+  source->GetSubstyle(child, false)->SetParent(base.get());
+  target->GetSubstyle(child, false)->ClearProperty(mark);
+  Behaviour(child).MergeParentProperty(target.get(), source.get(), child);
+  EXPECT_EQ(own->GetParent(), base.get());
+  EXPECT_EQ(Mark(own), 2.0);
+}
+
+TEST_F(SubstylePropertyTest, FlattenGivesOwnSubstylesCarryingInheritedValues) {
+  const std::unique_ptr<Style> base = Node(8);
+  const std::unique_ptr<Style> parent = Node(0);
+  parent->SetPathProperty({child, mark}, Any(7.0));
+  Style element(base.get(), node.Key()); // inherits its mark
+  parent->SetProperty(items, List{&element});
+  const std::unique_ptr<Style> holder = Node(0, parent.get());
+
+  EXPECT_TRUE(Behaviour(child).FlattenProperty(holder.get(), child));
+  const Style* sub = holder->GetSubstyle(child, false);
+  ASSERT_NE(sub, nullptr);
+  EXPECT_TRUE(sub->DoesOverrideProperty(mark));
+  EXPECT_EQ(Mark(sub), 7.0);
+  EXPECT_EQ(sub->GetOwner(), holder.get());
+
+  EXPECT_TRUE(Behaviour(items).FlattenProperty(holder.get(), items));
+  ASSERT_TRUE(holder->DoesOverrideProperty(items));
+  const Style* flat = Items(*holder)[0];
+  EXPECT_NE(flat, Items(*parent)[0]);
+  EXPECT_EQ(flat->GetParent(), nullptr);
+  EXPECT_TRUE(flat->DoesOverrideProperty(mark));
+  EXPECT_EQ(Mark(flat), 8.0);
+
+  // Nothing to inherit: nothing stored.
+  const std::unique_ptr<Style> alone = Node(0);
+  EXPECT_FALSE(Behaviour(child).FlattenProperty(alone.get(), child));
+  EXPECT_FALSE(Behaviour(items).FlattenProperty(alone.get(), items));
+  EXPECT_EQ(alone->GetProperties().size(), 1u);
 }
 
 } // namespace

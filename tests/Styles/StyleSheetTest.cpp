@@ -1,7 +1,10 @@
 #include <Styles/StyleSheet.h>
 
+#include "HostBehaviours.h"
+
 #include <Styles/StyleManager.h>
 #include <Styles/StyleProperty.h>
+#include <Styles/StyleUtilities.h>
 
 #include <ZelPref/ConversionPolicy.h>
 #include <ZelUtils/Stream.h>
@@ -28,6 +31,8 @@ const PropertyKey kCharacter(u"sheetTestCharacter");
 const PropertyKey kSize(u"size");
 const PropertyKey kFont(u"font");
 const PropertyKey kTag(u"tag");
+const PropertyKey kNested(u"nested");
+const PropertyKey kRuns(u"runs");
 
 // Every style made by MakeStyle carries a tag whose destruction is recorded
 // here, which makes ownership visible.
@@ -48,6 +53,16 @@ public:
   }
 };
 
+// A document `depth` objects deep: its character style "C" holds substyles
+// nested in substyles down to the last level.
+Text NestedSubstyles(int depth) {
+  std::u16string text = uR"({"sheetTestCharacter": {"C": )";
+  for (int level = 3; level < depth; ++level)
+    text += uR"({"nested": )";
+  text += u"{}" + std::u16string(depth - 3, u'}') + u"}}";
+  return Text(text);
+}
+
 class StyleSheetTest : public ::testing::Test {
 protected:
   void SetUp() override {
@@ -65,6 +80,11 @@ protected:
           new StyleProperty(Any(Text(u"Serif")), new ZelPref::TextConversionPolicy, &IsText));
       manager.RegisterProperty(category, kTag, new TagProperty);
     }
+    // Paragraphs hold a character substyle (keyed by its category) and a list
+    // of them; characters nest in characters.
+    RegisterSubstyleSet(kParagraph, kCharacter);
+    manager.RegisterProperty(kParagraph, kRuns, new StyleArrayProperty(kCharacter));
+    manager.RegisterProperty(kCharacter, kNested, new StyleSetProperty(kCharacter));
     DestroyedTags().clear();
   }
   void TearDown() override {
@@ -557,6 +577,13 @@ TEST_F(StyleSheetTest, DamagedDocuments) {
   const Text deepValue = Text(uR"({"sheetTestParagraph": {"D": {"size": )") +
                          Text(std::u16string(400, u'[')) + Text(std::u16string(400, u']')) + u"}}}";
   const Case cases[] = {
+      {"substyles beyond the nesting limit", NestedSubstyles(Json::kMaxDepth + 2), false},
+      {"substyles within the nesting limit", NestedSubstyles(Json::kMaxDepth - 2), true},
+      {"substyle is not an object", uR"({"sheetTestParagraph": {"A": {"sheetTestCharacter": 5}}})",
+       true},
+      {"list members of every kind",
+       uR"({"sheetTestParagraph": {"A": {"runs": [1, "x", null, {"size": "2"}, [], {}]}}})", true},
+      {"list is an object", uR"({"sheetTestParagraph": {"A": {"runs": {}}}})", true},
       {"empty", u"", false},
       {"truncated style", uR"({"sheetTestParagraph": {"A": {"size": "1)", false},
       {"array", u"[]", false},
@@ -585,6 +612,47 @@ TEST_F(StyleSheetTest, DamagedDocuments) {
       EXPECT_EQ(sheet.GetVersion(), 7);
     }
   }
+}
+
+// Substyles name sheet styles as parents: the names are written, resolved on
+// import, and the values baked in when those styles are deleted.
+TEST_F(StyleSheetTest, SubstylesRoundTripAndOutliveDeletedParents) {
+  StyleSheet sheet, copy;
+  Style* strong = Add(sheet, u"Strong", nullptr, kCharacter);
+  strong->SetProperty(kSize, 20.0);
+  Style* base = Add(sheet, u"Base");
+  PropertyPath path{kCharacter};
+  for (int depth = 0; depth < 5; ++depth, path.push_back(kNested))
+    base->SetPathProperty(MakePath(path, kFont), Text::FormatInternal("font %d", depth));
+  base->GetSubstyle(kCharacter, false)->SetParent(strong);
+  Style run(strong, kCharacter);
+  run.SetPathProperty({kNested, kFont}, Text(u"Mono"));
+  Add(sheet, u"Body", base)->SetProperty(kRuns, std::vector<Style*>{&run, &run});
+
+  const Text text = Export(sheet);
+  ASSERT_TRUE(copy.ImportFromString(text, true));
+  EXPECT_EQ(Export(copy), text);
+  Style* const character = copy.GetStyle(u"Base")->GetSubstyle(kCharacter, false);
+  const Style* body = copy.GetStyle(u"Body");
+  const std::vector<Style*> runs = body->GetProperty(kRuns).Get<std::vector<Style*>>();
+  ASSERT_EQ(runs.size(), 2u);
+  for (const Style* substyle : {character, runs[0], runs[1]})
+    EXPECT_EQ(substyle->GetParent(), copy.GetStyle(u"Strong"));
+
+  std::vector<Style*> doomed{copy.GetStyle(u"Strong")};
+  copy.DeleteStyles(StyleSpan(doomed, true));
+  for (const Style* substyle : {character, runs[0], runs[1]}) {
+    EXPECT_EQ(substyle->GetParent(), nullptr);
+    EXPECT_EQ(substyle->GetProperty(kSize).Get<double>(), 20.0);
+  }
+  EXPECT_EQ(body->GetSubstyle(kCharacter, true), character);
+  EXPECT_EQ(testing::CheckOwnerLinks(*copy.GetStyle(u"Base")), 5);
+  EXPECT_EQ(testing::CheckOwnerLinks(*body), 4);
+
+  // Deep but within the nesting limit: every level is read and linked.
+  StyleSheet deep;
+  ASSERT_TRUE(deep.ImportFromString(NestedSubstyles(3 + 500), true));
+  EXPECT_EQ(testing::CheckOwnerLinks(*deep.GetStyle(u"C")), 500);
 }
 
 TEST_F(StyleSheetTest, ImportFailuresPassThroughAfterPartialWork) {

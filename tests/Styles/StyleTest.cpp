@@ -44,7 +44,7 @@ TEST(PropertyKeyTest, OrderIsEntryIdentityNotText) {
   EXPECT_FALSE(keys[0] < keys[0]);
 }
 
-using testing::HostSubstyleProperty;
+using testing::CheckOwnerLinks;
 using testing::Number;
 using testing::ScopedCategory;
 using ZelUtils::Any;
@@ -56,10 +56,10 @@ protected:
   StyleTest() : corner(u"StyleTest.Corner"), border(u"StyleTest.Border"), para(u"StyleTest.Para") {
     radius = corner.Number(u"radius", 1.0);
     width = border.Number(u"width", 0.5);
-    cornerKey = border.Add(u"corner", new HostSubstyleProperty(corner.Key()));
+    cornerKey = border.Add(u"corner", new StyleSetProperty(corner.Key()));
     size = para.Number(u"size", 10.0);
     indent = para.Number(u"indent", 0.0);
-    borderKey = para.Add(u"border", new HostSubstyleProperty(border.Key()));
+    borderKey = para.Add(u"border", new StyleSetProperty(border.Key()));
   }
 
   Style* Para(Style* parent = nullptr) {
@@ -127,10 +127,10 @@ TEST_F(StyleTest, UnregisteredKeysAreNeverStoredAndThrowFromOneLookup) {
 }
 
 TEST_F(StyleTest, SettingClearingAndSelfAssignmentDestroyOldValuesOnce) {
-  int destroyed = 0;
+  testing::ValueCounts counts;
+  int& destroyed = counts.destroyed;
   ScopedCategory counting(u"StyleTest.Counting");
-  const PropertyKey count =
-      counting.Add(u"count", new testing::CountingNumberProperty(0, &destroyed));
+  const PropertyKey count = counting.Add(u"count", new testing::CountingNumberProperty(0, &counts));
   Style style(nullptr, counting.Key());
 
   style.SetProperty(count, Any(1.0));
@@ -278,7 +278,7 @@ TEST_F(StyleTest, OwnerBasedInheritanceThreeLevelsDeep) {
   // A category whose substyle holds a paragraph, so the chain can go deeper
   // than the two keys kept without allocating.
   ScopedCategory outer(u"StyleTest.Outer");
-  const PropertyKey paraKey = outer.Add(u"para", new HostSubstyleProperty(para.Key()));
+  const PropertyKey paraKey = outer.Add(u"para", new StyleSetProperty(para.Key()));
   Style p(nullptr, outer.Key());
   p.SetPathProperty({paraKey, borderKey, cornerKey, radius}, Any(6.0));
   Style a(&p, outer.Key());
@@ -416,7 +416,7 @@ TEST_F(StyleTest, SetPathPropertyFromSourceCopiesOnlyOwnValues) {
 
 TEST_F(StyleTest, ExternalIdReachesDirectSubstylesOfOrdinaryStylesOnly) {
   ScopedCategory ordinary(u"style");
-  const PropertyKey paraKey = ordinary.Add(u"StyleTest.para", new HostSubstyleProperty(para.Key()));
+  const PropertyKey paraKey = ordinary.Add(u"StyleTest.para", new StyleSetProperty(para.Key()));
   Style style(nullptr, StyleCategoryName);
   style.SetPathProperty({paraKey, borderKey, width}, Any(1.0));
   style.SetExternalID(u"E1");
@@ -615,6 +615,203 @@ TEST_F(StyleChainTest, CopySubstylePropertiesDependsOnSharedInheritance) {
   // A source resolving to the null default clears the key.
   stranger->CopySubstyleProperties(Para(), borderKey);
   EXPECT_EQ(stranger->GetSubstyle(borderKey, false), nullptr);
+}
+
+// Nodes carry a counted mark, a child node, a list of item nodes and a
+// substyle keyed by their own category's name, as RegisterSubstyleSet makes.
+class StyleTreeTest : public ::testing::Test {
+protected:
+  using List = std::vector<Style*>;
+
+  StyleTreeTest() : node(u"StyleTest.Node", u"Node") {
+    mark = node.Add(u"mark", new testing::CountingNumberProperty(0, &counts));
+    child = node.Add(u"child", new StyleSetProperty(node.Key()));
+    items = node.Add(u"items", new StyleArrayProperty(PropertyKey::Empty));
+    RegisterSubstyleSet(node.Key(), node.Key());
+  }
+  ~StyleTreeTest() override { EXPECT_EQ(counts.Live(), 0); }
+
+  // Ten marked nodes: the root, a chain of children five deep under it, and
+  // two items that own a child each.
+  std::unique_ptr<Style> Tree(Style* parent = nullptr) {
+    auto root = std::make_unique<Style>(parent, node.Key());
+    PropertyPath path;
+    for (int depth = 0; depth <= 5; ++depth, path.push_back(child))
+      root->SetPathProperty(MakePath(path, mark), Any(double(depth)));
+    Style item(nullptr, node.Key());
+    item.SetPathProperty({child, mark}, Any(9.0));
+    item.SetProperty(mark, Any(8.0));
+    root->SetProperty(items, List{&item, &item});
+    return root;
+  }
+  Style* Deep(const Style& root, int depth) const {
+    const Style* style = &root;
+    while (style && depth-- > 0)
+      style = style->GetSubstyle(child, false);
+    return const_cast<Style*>(style);
+  }
+  testing::ValueCounts counts;
+  ScopedCategory node;
+  PropertyKey mark, child, items;
+};
+
+TEST_F(StyleTreeTest, OwnerLinksSurviveEveryOperationThatMovesSubstyles) {
+  const std::unique_ptr<Style> base = Tree();
+  const std::unique_ptr<Style> tree = Tree(base.get());
+  StyleSheet sheet;
+  sheet.SetVersion(1);
+  struct Case {
+    const char* label;
+    std::function<std::unique_ptr<Style>()> make;
+  };
+  const Case cases[] = {
+      {"copy", [&] { return std::make_unique<Style>(*tree); }},
+      {"move",
+       [&] {
+         Style scratch(*tree);
+         return std::make_unique<Style>(std::move(scratch));
+       }},
+      {"swap",
+       [&] {
+         Style scratch(*tree);
+         auto style = std::make_unique<Style>();
+         style->SwapData(scratch);
+         return style;
+       }},
+      {"merge into nothing",
+       [&] {
+         auto style = std::make_unique<Style>(nullptr, node.Key());
+         style->MergeProperties(tree.get(), false);
+         return style;
+       }},
+      {"merge into own substyles",
+       [&] {
+         std::unique_ptr<Style> style = Tree();
+         style->MergeProperties(tree.get(), true);
+         return style;
+       }},
+      {"merge parent",
+       [&] {
+         auto style = std::make_unique<Style>(tree.get(), node.Key());
+         style->MergeParentProperties(tree.get());
+         return style;
+       }},
+      {"flatten",
+       [&] {
+         auto style = std::make_unique<Style>(*tree);
+         style->Flatten();
+         return style;
+       }},
+      {"flattened clone", [&] { return std::unique_ptr<Style>(tree->CreateFlattenedStyle()); }},
+      {"remove all dependencies",
+       [&] {
+         auto style = std::make_unique<Style>(*tree);
+         style->RemoveAllDependencies();
+         return style;
+       }},
+      {"JSON round trip",
+       [&] {
+         JsonValue json;
+         tree->Serialize(sheet, json, false);
+         return std::unique_ptr<Style>(
+             Style::Deserialize(sheet, json.Get<Json::Object>(), node.Key()));
+       }},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.label);
+    const int live = counts.Live();
+    std::unique_ptr<Style> result = c.make();
+    EXPECT_EQ(CheckOwnerLinks(*result), 9);
+    EXPECT_EQ(Number(Deep(*result, 5)->GetProperty(mark)), 5.0);
+    EXPECT_EQ(counts.Live(), live + 10);
+    result.reset();
+    EXPECT_EQ(counts.Live(), live);
+  }
+  EXPECT_EQ(CheckOwnerLinks(*tree), 9);
+}
+
+TEST_F(StyleTreeTest, RevertKeepsSingleSubstylesAndClearKeepsIdentity) {
+  const std::unique_ptr<Style> base = Tree();
+  const std::unique_ptr<Style> style = Tree(base.get());
+  style->SetExternalID(u"E");
+  Style* deepest = Deep(*style, 5);
+  EXPECT_TRUE(style->RevertAllProperties());
+  // The chain stays, emptied; the list and every mark are gone.
+  EXPECT_EQ(CheckOwnerLinks(*style), 5);
+  EXPECT_EQ(Deep(*style, 5), deepest);
+  EXPECT_TRUE(style->IsEmptyWithEmptySubstyles());
+  EXPECT_EQ(counts.Live(), 10);
+  EXPECT_FALSE(style->RevertAllProperties());
+  EXPECT_EQ(style->GetParent(), base.get());
+  // Reverted substyles inherit again through their owners' parents.
+  EXPECT_EQ(Number(deepest->GetProperty(mark)), 5.0);
+
+  style->SetProperty(mark, Any(1.0));
+  style->Clear();
+  EXPECT_TRUE(style->GetProperties().empty());
+  EXPECT_EQ(style->GetParent(), nullptr);
+  EXPECT_EQ(style->GetCategoryName(), node.Key());
+  EXPECT_EQ(style->GetExternalID(), ZelStringT<char16_t>(u"E"));
+  EXPECT_EQ(counts.Live(), 10);
+}
+
+TEST_F(StyleTreeTest, OverriddenPathsAndTheWildcard) {
+  const PropertyKey any(u"*");
+  const std::unique_ptr<Style> tree = Tree();
+  const std::unique_ptr<Style> empty = std::make_unique<Style>(nullptr, node.Key());
+  const Style onlyParent(empty.get(), node.Key());
+  Style emptyChildWithParent(nullptr, node.Key()); // holds an empty child that has a parent
+  GetOrCreateSubstyle(emptyChildWithParent, child)->SetParent(empty.get());
+  Style emptyItem(nullptr, node.Key());
+  Style emptyItems(nullptr, node.Key());
+  emptyItems.SetProperty(items, List{&emptyItem});
+  struct Case {
+    const char* label;
+    const Style* style;
+    PropertyPath path;
+    bool overrides;
+  };
+  for (const Case& c : {
+           Case{"empty path", tree.get(), {}, false},
+           Case{"own value", tree.get(), {mark}, true},
+           Case{"own list", tree.get(), {items}, true},
+           Case{"five deep", tree.get(), {child, child, child, child, child, mark}, true},
+           Case{"missing substyle",
+                tree.get(),
+                {child, child, child, child, child, child, mark},
+                false},
+           Case{"a list is no substyle", tree.get(), {items, mark}, false},
+           Case{"inherited does not count", &onlyParent, {mark}, false},
+           Case{"wildcard on values", tree.get(), {child, any}, true},
+           Case{"wildcard on nothing", empty.get(), {any}, false},
+           Case{"wildcard on a missing substyle", empty.get(), {child, any}, false},
+           Case{"wildcard with only a parent", &onlyParent, {any}, true},
+           Case{"wildcard on a substyle's parent", &emptyChildWithParent, {any}, true},
+           Case{"wildcard on empty items", &emptyItems, {any}, false},
+       }) {
+    SCOPED_TRACE(c.label);
+    EXPECT_EQ(c.style->DoesOverridePathProperty(c.path), c.overrides);
+  }
+  EXPECT_TRUE(emptyChildWithParent.IsEmptyWithEmptySubstyles());
+  EXPECT_TRUE(emptyChildWithParent.SubstylesHaveAnyParentalRelationships());
+  EXPECT_FALSE(tree->SubstylesHaveAnyParentalRelationships());
+  emptyItem.SetParent(empty.get()); // the stored copy keeps no parent
+  EXPECT_FALSE(emptyItems.SubstylesHaveAnyParentalRelationships());
+  emptyItems.SetProperty(items, List{&emptyItem});
+  EXPECT_TRUE(emptyItems.SubstylesHaveAnyParentalRelationships());
+}
+
+TEST_F(StyleTreeTest, SubstyleCountsAndNames) {
+  std::unique_ptr<Style> style = Tree();
+  EXPECT_EQ(style->GetNumSubstyles(), 1u); // the list does not count
+  // Looked up under the element category's name, deliberately: a substyle
+  // keyed otherwise is not found.
+  EXPECT_EQ(style->GetLastSubstyle(), nullptr);
+  Style* named = GetOrCreateSubstyle(*style, node.Key());
+  EXPECT_EQ(style->GetNumSubstyles(), 2u);
+  EXPECT_EQ(style->GetLastSubstyle(), named);
+  EXPECT_EQ(style->GetCategoryUIName(), ZelStringT<char16_t>(u"Node"));
+  EXPECT_TRUE(Style().GetCategoryUIName().IsEmpty());
 }
 
 // Number properties with the flags a host may switch on.

@@ -1,5 +1,9 @@
 #include <Styles/StyleUtilities.h>
 
+#include <Styles/StyleCategory.h>
+#include <Styles/StyleManager.h>
+#include <Styles/StyleProperty.h>
+
 #include <gtest/gtest.h>
 
 #include <string>
@@ -62,6 +66,41 @@ TEST(StyleUtilitiesTest, SplitPathInternsEveryPiece) {
 TEST(StyleUtilitiesTest, StyleCategoryNameIsStyle) {
   EXPECT_EQ(StyleCategoryName, PropertyKey(u"style"));
   EXPECT_EQ(StyleCategoryName.ToString(), ZelStringT<char16_t>(u"style"));
+}
+
+// The refused behaviours of the repeated and the misdirected registrations
+// must be freed: LeakSanitizer checks that.
+TEST(StyleUtilitiesTest, SubstyleSetsAndTheCategoryOfOrdinaryStyles) {
+  StyleManager& manager = GetStyleManager();
+  const PropertyKey marked(u"UtilitiesTest.Marked"), plain(u"UtilitiesTest.Plain"),
+      later(u"UtilitiesTest.Later");
+  manager.RegisterCategory(marked, u"Marked", true, false);
+  manager.RegisterCategory(plain, u"Plain", false, false);
+  RegisterStyleCategory(u"Style");
+  manager.RegisterCategory(later, u"Later", true, false);
+  RegisterStyleCategory(u"Again");
+
+  EXPECT_EQ(manager.TranslateCategory(StyleCategoryName), ZelStringT<char16_t>(u"Style"));
+  EXPECT_TRUE(manager.GetCategory(StyleCategoryName)->GetFlag());
+  const BaseStyleProperty* set = manager.GetStyleProperty(StyleCategoryName, marked);
+  ASSERT_NE(set, nullptr);
+  EXPECT_TRUE(set->IsSubstyle());
+  EXPECT_EQ(set->GetElementCategoryName(), marked);
+  EXPECT_EQ(set->GetDefaultValue().Get<Style*>(), nullptr);
+  EXPECT_EQ(manager.GetStyleProperty(StyleCategoryName, plain), nullptr);
+  // Marked after the first call, so only the second one added it.
+  EXPECT_NE(manager.GetStyleProperty(StyleCategoryName, later), nullptr);
+
+  RegisterSubstyleSet(plain, marked);
+  const BaseStyleProperty* first = manager.GetStyleProperty(plain, marked);
+  RegisterSubstyleSet(plain, marked);
+  RegisterSubstyleSet(PropertyKey(u"UtilitiesTest.Unknown"), marked);
+  EXPECT_EQ(manager.GetStyleProperty(plain, marked), first);
+  EXPECT_EQ(first->GetElementCategoryName(), marked);
+
+  DeregisterStyleCategory();
+  for (const PropertyKey& key : {marked, plain, later})
+    manager.DeregisterCategory(key);
 }
 
 TEST(StyleUtilitiesTest, ConvertToValidStyleNameFiltersThenTrims) {

@@ -571,6 +571,97 @@ void Style::SetProperties(const std::vector<std::vector<PropertyKey>>& paths, co
 }
 
 // ---------------------------------------------------------------------------
+// Resetting and structural queries
+
+bool Style::RevertAllProperties() {
+  bool removed = false;
+  for (std::size_t i = 0; i < m_properties.size();) {
+    PropertyMap::Entry& entry = m_properties[i];
+    if (Style* const* substyle = entry.second.GetIf<Style*>(); substyle && *substyle) {
+      // Single substyles stay, emptied in turn.
+      removed = (*substyle)->RevertAllProperties() || removed;
+      ++i;
+      continue;
+    }
+    const PropertyKey key = entry.first;
+    if (const BaseStyleProperty* behaviour = FindBehaviour(key))
+      behaviour->DestroyPropertyData(entry.second);
+    m_properties.Erase(key);
+    removed = true;
+  }
+  return removed;
+}
+
+void Style::Clear() {
+  DestroyOwnValues();
+  m_parent = nullptr;
+}
+
+bool Style::SubstylesHaveAnyParentalRelationships() const {
+  bool found = false;
+  const StyleVisitor visit = [&found](Style* substyle) {
+    found = substyle && (substyle->m_parent || substyle->SubstylesHaveAnyParentalRelationships());
+    return !found;
+  };
+  for (const PropertyMap::Entry& entry : m_properties) {
+    if (const BaseStyleProperty* behaviour = FindBehaviour(entry.first))
+      behaviour->ProcessStylesInProperty(entry.second, visit);
+    if (found)
+      return true;
+  }
+  return false;
+}
+
+bool Style::IsEmptyWithEmptySubstyles() const {
+  // A null substyle holds nothing, so it counts as empty.
+  const StyleVisitor visit = [](Style* substyle) {
+    return !substyle || substyle->IsEmptyWithEmptySubstyles();
+  };
+  for (const PropertyMap::Entry& entry : m_properties) {
+    const BaseStyleProperty* behaviour = FindBehaviour(entry.first);
+    if (!behaviour || !behaviour->ProcessStylesInProperty(entry.second, visit))
+      return false;
+  }
+  return true;
+}
+
+bool Style::DoesOverridePathProperty(const std::vector<PropertyKey>& path) const {
+  if (path.empty())
+    return false;
+  const Style* style = this;
+  for (std::size_t i = 0; i + 1 < path.size(); ++i)
+    if (!(style = style->GetSubstyle(path[i], false)))
+      return false;
+  static const PropertyKey wildcard(u"*");
+  if (path.back() == wildcard)
+    return style->m_parent || !style->IsEmptyWithEmptySubstyles() ||
+           style->SubstylesHaveAnyParentalRelationships();
+  return style->m_properties.Contains(path.back());
+}
+
+ZelStringT<char16_t> Style::GetCategoryUIName() const {
+  return m_category ? m_category->GetUIName() : ZelStringT<char16_t>();
+}
+
+unsigned Style::GetNumSubstyles() const {
+  unsigned count = 0;
+  for (const PropertyMap::Entry& entry : m_properties)
+    if (const BaseStyleProperty* behaviour = FindBehaviour(entry.first))
+      count += behaviour->IsSubstyle() ? 1 : 0;
+  return count;
+}
+
+Style* Style::GetLastSubstyle() const {
+  for (std::size_t i = m_properties.size(); i-- > 0;) {
+    const BaseStyleProperty* behaviour = FindBehaviour(m_properties[i].first);
+    // Looked up by element category name, which names single substyles.
+    if (behaviour && behaviour->IsSubstyle())
+      return GetSubstyle(behaviour->GetElementCategoryName(), false);
+  }
+  return nullptr;
+}
+
+// ---------------------------------------------------------------------------
 // Merging, flattening and owner-free clones
 
 void Style::MergeProperties(const Style* other, bool overwrite) {

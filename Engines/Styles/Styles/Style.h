@@ -233,6 +233,30 @@ public:
   void SetPathProperty(const std::vector<PropertyKey>& path, const Style* source);
   void SetProperties(const std::vector<std::vector<PropertyKey>>& paths, const Style* source);
 
+  // Resetting and structural queries.
+  // Removes every own value but the single substyles, which are emptied the
+  // same way; true when anything was removed at any depth. Links, category
+  // and strings stay.
+  bool RevertAllProperties();
+  // Destroys every own value, substyles included, and cuts the parent link;
+  // owner, category and strings stay.
+  void Clear();
+  // Whether a substyle at any depth has a parent.
+  bool SubstylesHaveAnyParentalRelationships() const;
+  // Whether the style holds nothing but substyles that are empty the same way.
+  bool IsEmptyWithEmptySubstyles() const;
+  // Whether the style reached along `path` through own substyles sets the
+  // last key itself. A last key "*" asks whether it sets or inherits anything
+  // at all (a parent, a value, a substyle with a parent).
+  bool DoesOverridePathProperty(const std::vector<PropertyKey>& path) const;
+  // The UI name of the style's category; empty without category.
+  ZelStringT<char16_t> GetCategoryUIName() const;
+  // The number of own single-substyle values; arrays do not count.
+  unsigned GetNumSubstyles() const;
+  // The own substyle of the last single-substyle entry in key order, looked
+  // up under that behaviour's element category name; null when none.
+  Style* GetLastSubstyle() const;
+
   // Merging and flattening.
   // Merges every own value of `other` through the behaviours of `other`'s
   // category; with `overwrite` false values this style sets itself stay.
@@ -297,6 +321,9 @@ public:
                             const PropertyKey& category);
 
 private:
+  // Adopts deserialized substyles into the property map without copying.
+  friend class StyleSetProperty;
+
   // The behaviour of `key` in this style's category, or null.
   BaseStyleProperty* FindBehaviour(const PropertyKey& key) const;
   void DestroyOwnValues();

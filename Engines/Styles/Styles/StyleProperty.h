@@ -146,4 +146,115 @@ private:
   TypeCheck m_typeCheck;
 };
 
+// The behaviour of a property whose value is one substyle: an Any holding a
+// Style* (null for none) of the element category, owned by the holding style,
+// which it names as owner under this property's name.
+class STYLES_API StyleSetProperty : public BaseStyleProperty {
+public:
+  // The default value is a null Style*.
+  explicit StyleSetProperty(const PropertyKey& elementCategory);
+  // Deletes a substyle held by the default value; a default of another kind
+  // ends the process (std::bad_cast in a destructor).
+  ~StyleSetProperty() override;
+
+  PropertyKey GetElementCategoryName() const override;
+  // The substyle's JSON object without temporary properties; JSON null for
+  // no substyle. Not written (false) for a sheet older than the minimum version.
+  bool Serialize(const StyleSheet& sheet, const Style* style, const ZelUtils::Any& value,
+                 JsonValue& out) const override;
+  // Reads a JSON object into a new substyle that `style` adopts without a
+  // copy; an own value already there is kept. False for anything but an object.
+  bool Deserialize(const StyleSheet& sheet, Style* style, const JsonValue& in) const override;
+  void DestroyPropertyData(const ZelUtils::Any& value) const override;
+  // A copy of the held Style* or const Style*, owned by `owner`; empty for null.
+  ZelUtils::Any MovePropertyData(Style* owner, ZelUtils::Any&& value) const override;
+  // Without `parentOnly` what the substyle depends on; with it, the
+  // substyle's parent when that is in `styles`.
+  std::vector<Style*> GetDependencies(const ZelUtils::Any& value, StyleSpan styles,
+                                      bool parentOnly) const override;
+  bool HasDependency(const ZelUtils::Any& value, StyleSpan styles, bool parentOnly) const override;
+  void RemoveDependency(ZelUtils::Any& value, StyleSpan styles, bool parentOnly) const override;
+  bool HasParentalDependency(const ZelUtils::Any& value) const override;
+  void RemoveAllDependencies(ZelUtils::Any& value) const override;
+  void RemapDependency(ZelUtils::Any& value, const std::map<Style*, Style*>& map) const override;
+  void
+  RemapPointer(ZelUtils::Any& value,
+               const std::vector<std::pair<ZelUtils::Any, ZelUtils::Any>>& pairs) const override;
+  void SetOwner(ZelUtils::Any& value, Style* owner, const PropertyKey& key) const override;
+  // Visits the values inside the substyle, not this value.
+  bool ProcessProperty(ZelUtils::Any& value, const PropertyVisitor& fn, Style* style,
+                       const PropertyKey& key) const override;
+  // A substyle the target holds itself is merged into, never replaced
+  // (`overwrite` applies inside it); otherwise the target gets a copy of the
+  // source's own substyle.
+  void MergeProperty(Style* target, const Style* source, const PropertyKey& key,
+                     bool overwrite) const override;
+  // A parentless own substyle takes over the parent's substyle and its
+  // parent; without an own substyle the target gets a copy of the parent's.
+  void MergeParentProperty(Style* target, const Style* parent,
+                           const PropertyKey& key) const override;
+  // Gives the style an own substyle that carries every inherited value.
+  bool FlattenProperty(Style* style, const PropertyKey& key) const override;
+  bool IsEqual(const ZelUtils::Any& a, const ZelUtils::Any& b) const override;
+  bool IsLess(const ZelUtils::Any& a, const ZelUtils::Any& b) const override;
+  // Calls `fn` on the substyle, also when it is null.
+  bool ProcessStylesInProperty(const ZelUtils::Any& value, const StyleVisitor& fn) const override;
+  bool CheckType(const ZelUtils::Any& value) const override;
+  bool IsSubstyle() const override;
+
+private:
+  PropertyKey m_elementCategory;
+};
+
+// The behaviour of a property whose value is an ordered list of substyles:
+// an Any holding std::vector<Style*>, whose elements may be null. The holding
+// style owns the substyles; they are not linked back to it as owner.
+class STYLES_API StyleArrayProperty : public BaseStyleProperty {
+public:
+  // The default value is an empty list; an empty `elementCategory` means the
+  // category that registers this property.
+  explicit StyleArrayProperty(const PropertyKey& elementCategory);
+  ~StyleArrayProperty() override;
+
+  PropertyKey GetElementCategoryName() const override;
+  // A JSON array of the objects of the non-null substyles, without temporary
+  // properties. Not written (false) for a sheet older than the minimum version.
+  bool Serialize(const StyleSheet& sheet, const Style* style, const ZelUtils::Any& value,
+                 JsonValue& out) const override;
+  // Reads the objects of a JSON array (other elements are dropped) and stores
+  // the list, also when empty. False for anything but an array.
+  bool Deserialize(const StyleSheet& sheet, Style* style, const JsonValue& in) const override;
+  void DestroyPropertyData(const ZelUtils::Any& value) const override;
+  // A list of copies of the elements (null stays null), without owner links;
+  // the caller keeps the styles of `value`.
+  ZelUtils::Any MovePropertyData(Style* owner, ZelUtils::Any&& value) const override;
+  // Without `parentOnly` what the substyles depend on; with it, the substyles
+  // themselves that are in `styles` (unlike HasDependency, which then looks
+  // at their parents).
+  std::vector<Style*> GetDependencies(const ZelUtils::Any& value, StyleSpan styles,
+                                      bool parentOnly) const override;
+  bool HasDependency(const ZelUtils::Any& value, StyleSpan styles, bool parentOnly) const override;
+  void RemoveDependency(ZelUtils::Any& value, StyleSpan styles, bool parentOnly) const override;
+  bool HasParentalDependency(const ZelUtils::Any& value) const override;
+  void RemoveAllDependencies(ZelUtils::Any& value) const override;
+  void RemapDependency(ZelUtils::Any& value, const std::map<Style*, Style*>& map) const override;
+  void
+  RemapPointer(ZelUtils::Any& value,
+               const std::vector<std::pair<ZelUtils::Any, ZelUtils::Any>>& pairs) const override;
+  // Visits the values inside every non-null substyle; false when stopped.
+  bool ProcessProperty(ZelUtils::Any& value, const PropertyVisitor& fn, Style* style,
+                       const PropertyKey& key) const override;
+  // Stores flattened copies of the effective list; false when there is none.
+  bool FlattenProperty(Style* style, const PropertyKey& key) const override;
+  bool IsEqual(const ZelUtils::Any& a, const ZelUtils::Any& b) const override;
+  // Shorter lists first, then the first differing element.
+  bool IsLess(const ZelUtils::Any& a, const ZelUtils::Any& b) const override;
+  // Calls `fn` on every element, null ones included; false when stopped.
+  bool ProcessStylesInProperty(const ZelUtils::Any& value, const StyleVisitor& fn) const override;
+  bool CheckType(const ZelUtils::Any& value) const override;
+
+private:
+  PropertyKey m_elementCategory;
+};
+
 } // namespace Styles

@@ -1,10 +1,12 @@
 #include <Styles/StyleUtilities.h>
 
 #include <Styles/StyleCategory.h>
+#include <Styles/StyleManager.h>
 #include <Styles/StyleProperty.h>
 
 #include <ZelUtils/String.h>
 
+#include <memory>
 #include <utility>
 
 namespace Styles {
@@ -36,6 +38,24 @@ constexpr char16_t kAllowedNameCharacters[] =
 constexpr char16_t kRemovedNameCharacters[] = u"\t\n\"~";
 
 } // namespace
+
+void RegisterSubstyleSet(const PropertyKey& categoryKey, const PropertyKey& propertyKey) {
+  StyleManager& manager = GetStyleManager();
+  std::unique_ptr<StyleSetProperty> property(new StyleSetProperty(propertyKey));
+  manager.RegisterProperty(categoryKey, propertyKey, property.get());
+  // A behaviour the category did not take (unknown category, key taken) is
+  // owned by nobody else, so it is freed here.
+  if (manager.GetStyleProperty(categoryKey, propertyKey) == property.get())
+    property.release();
+}
+
+void RegisterStyleCategory(const ZelStringT<char16_t>& uiName) {
+  StyleManager& manager = GetStyleManager();
+  const std::vector<PropertyKey> substyleSets = manager.GetSubstyleSetCategories();
+  manager.RegisterCategory(StyleCategoryName, uiName, false, true);
+  for (const PropertyKey& key : substyleSets)
+    RegisterSubstyleSet(StyleCategoryName, key);
+}
 
 PropertyPath MakePath(const PropertyKey& a) { return PropertyPath{a}; }
 

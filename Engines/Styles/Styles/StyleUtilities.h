@@ -1,6 +1,7 @@
-// Free functions of the style library: property paths (sequences of keys that
-// lead through substyles to a property), the category key of ordinary styles
-// and the cleaning of user-typed style names.
+// Free functions of the style library: registration of substyle properties
+// and of the category of ordinary styles, property paths (sequences of keys
+// that lead through substyles to a property), the category key of ordinary
+// styles and the cleaning of user-typed style names.
 #pragma once
 
 #include <Styles/Export.h>
@@ -13,6 +14,17 @@ namespace Styles {
 
 // The key of the category of ordinary (top-level) styles, "style".
 STYLES_API extern const PropertyKey StyleCategoryName;
+
+// Registers under `propertyKey` of category `categoryKey` a new substyle
+// property (StyleSetProperty) whose element category is `propertyKey`, owned
+// by the category. Nothing is registered, and nothing kept, when the
+// category is unknown or already has the key.
+STYLES_API void RegisterSubstyleSet(const PropertyKey& categoryKey, const PropertyKey& propertyKey);
+// Registers the category of ordinary styles (StyleCategoryName) with
+// `uiName`, giving it one substyle property per category registered before
+// with addToStyleCategory, keyed by that category's key. Meant to run once,
+// after those categories; a later call adds only the keys still missing.
+STYLES_API void RegisterStyleCategory(const ZelStringT<char16_t>& uiName);
 
 // A path of keys from the outermost style to a property; every key but the
 // last names a substyle-holding property.
