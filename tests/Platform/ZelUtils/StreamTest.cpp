@@ -95,6 +95,29 @@ TEST_F(StreamTest, BadPathsGiveUnusableStreams) {
   EXPECT_EQ(MemoryStream::GetBytes(unusable), "");
 }
 
+TEST_F(StreamTest, TemporaryFilesAreNewAndSyncOnlyFiles) {
+  Text first, second;
+  Stream stream = FileStream::CreateTemporary(PathOf(u""), first);
+  ASSERT_TRUE(stream && stream.IsWritable());
+  ASSERT_TRUE(FileStream::CreateTemporary(PathOf(u""), second));
+  EXPECT_NE(first, second);
+  const std::string name = std::filesystem::path(first.GetStdString()).filename().string();
+  EXPECT_EQ(name.rfind(".tmp-", 0), 0u) << name;
+  EXPECT_EQ(PathOf(std::u16string(name.begin(), name.end())), first);
+  EXPECT_TRUE(stream.Write("abc", 3));
+  EXPECT_TRUE(FileStream::SyncToDisk(stream));
+  EXPECT_EQ(ReadAll(FileStream::Open(first)), "abc");
+
+  EXPECT_FALSE(FileStream::SyncToDisk(FileStream::Open(first)));
+  EXPECT_FALSE(FileStream::SyncToDisk(MemoryStream::Create()));
+  EXPECT_FALSE(FileStream::SyncToDisk(Stream()));
+  for (const Text& folder : {Text(), PathOf(u"missing"), first}) {
+    Text path = u"stale";
+    EXPECT_FALSE(FileStream::CreateTemporary(folder, path));
+    EXPECT_EQ(path, Text());
+  }
+}
+
 TEST_F(StreamTest, MemoryStreamsShareBytesAndPosition) {
   Stream stream = MemoryStream::FromBytes("abcdef");
   Stream copy = stream;
