@@ -24,8 +24,13 @@ public:
       : m_stream(ZelUtils::FileStream::CreateTemporary(folder, m_path)) {}
   ~TemporaryFile() {
     m_stream = ZelUtils::Stream();
-    if (!m_path.IsEmpty())
+    if (m_path.IsEmpty())
+      return;
+    try {
       SystemIO::File::Remove(m_path);
+    } catch (...) {
+      // Out of memory for the path: a stray temporary file beats a crash.
+    }
   }
   TemporaryFile(const TemporaryFile&) = delete;
   TemporaryFile& operator=(const TemporaryFile&) = delete;
