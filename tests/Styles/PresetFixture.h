@@ -1,6 +1,6 @@
-// Shared setup of the preset tests: a fresh folder per test (removed after
-// it) holding the preset folder, and a category whose "tag" property records
-// every destroyed value and refuses to be written when it reads "explode".
+// Shared setup of the preset tests: a fresh folder per test, removed after
+// it, with the preset folder inside; and a category whose "tag" records every
+// destroyed value and refuses to be written when it reads "explode".
 #pragma once
 
 #include <Styles/FolderPresetManager.h>
@@ -26,28 +26,27 @@ namespace Styles {
 namespace testing {
 
 using Text = ZelStringT<char16_t>;
+using Names = std::vector<Text>;
 
-inline std::vector<Text>& DestroyedPresetTags() {
-  static std::vector<Text> tags;
+inline Names& DestroyedTags() {
+  static Names tags;
   return tags;
 }
+inline bool IsPresetText(const ZelUtils::Any& value) { return value.GetIf<Text>() != nullptr; }
+inline bool IsPresetNumber(const ZelUtils::Any& value) { return value.GetIf<double>() != nullptr; }
 
 class PresetTagProperty : public StyleProperty {
 public:
-  PresetTagProperty()
-      : StyleProperty(ZelUtils::Any(Text()), new ZelPref::TextConversionPolicy, &IsText) {}
+  PresetTagProperty() : StyleProperty(Text(), new ZelPref::TextConversionPolicy, &IsPresetText) {}
   void DestroyPropertyData(const ZelUtils::Any& value) const override {
-    DestroyedPresetTags().push_back(value.Get<Text>());
+    DestroyedTags().push_back(value.Get<Text>());
   }
   bool Serialize(const StyleSheet& sheet, const Style* style, const ZelUtils::Any& value,
                  JsonValue& out) const override {
     if (value.Get<Text>() == u"explode")
-      throw std::runtime_error("tag refuses to be written");
+      throw std::runtime_error("refused");
     return StyleProperty::Serialize(sheet, style, value, out);
   }
-
-private:
-  static bool IsText(const ZelUtils::Any& value) { return value.GetIf<Text>() != nullptr; }
 };
 
 class PresetFixture : public ::testing::Test {
@@ -62,16 +61,16 @@ protected:
     std::filesystem::create_directories(m_root / "presets");
     StyleManager& manager = GetStyleManager();
     m_savedVersion = manager.GetCurrentVersion();
-    manager.SetCurrentVersion(3); // properties are written from version 0 on
+    manager.SetCurrentVersion(3); // values are written from version 0 on
     manager.RegisterCategory(kCategory, u"Paragraph", false, false);
     manager.RegisterProperty(
         kCategory, kSize,
-        new StyleProperty(ZelUtils::Any(12.0), new ZelPref::NumberConversionPolicy, &IsNumber));
-    manager.RegisterProperty(kCategory, kFont,
-                             new StyleProperty(ZelUtils::Any(Text(u"Serif")),
-                                               new ZelPref::TextConversionPolicy, &IsText));
+        new StyleProperty(12.0, new ZelPref::NumberConversionPolicy, &IsPresetNumber));
+    manager.RegisterProperty(
+        kCategory, kFont,
+        new StyleProperty(Text(u"Serif"), new ZelPref::TextConversionPolicy, &IsPresetText));
     manager.RegisterProperty(kCategory, kTag, new PresetTagProperty);
-    DestroyedPresetTags().clear();
+    DestroyedTags().clear();
   }
   void TearDown() override {
     GetStyleManager().DeregisterCategory(kCategory);
@@ -79,11 +78,8 @@ protected:
     std::filesystem::remove_all(m_root);
   }
 
-  // The preset folder as the managers take it (ASCII temp folders only).
-  Text Folder() const {
-    const std::string folder = (m_root / "presets").string();
-    return Text(std::u16string(folder.begin(), folder.end()));
-  }
+  // The preset folder (temp folders have ASCII names).
+  Text Folder() const { return (m_root / "presets").u16string(); }
   std::filesystem::path FileOf(const std::string& name) const { return m_root / "presets" / name; }
   std::string ReadFile(const std::string& name) const {
     std::ifstream in(FileOf(name), std::ios::binary);
@@ -99,9 +95,9 @@ protected:
       entries.insert(std::filesystem::relative(entry.path(), m_root).string());
     return entries;
   }
-  // A free style tagged `tag`; the caller owns it.
-  static Style* MakeStyle(const Text& tag, double size = 12.0, Style* parent = nullptr) {
-    Style* style = new Style(parent, kCategory);
+  // A free style; the caller owns it.
+  static Style* MakeStyle(const Text& tag, double size = 12.0) {
+    Style* style = new Style(nullptr, kCategory);
     style->SetProperty(kTag, tag);
     style->SetProperty(kSize, size);
     return style;
@@ -116,8 +112,6 @@ protected:
 
 private:
   int m_savedVersion = 0;
-  static bool IsNumber(const ZelUtils::Any& value) { return value.GetIf<double>() != nullptr; }
-  static bool IsText(const ZelUtils::Any& value) { return value.GetIf<Text>() != nullptr; }
 };
 
 } // namespace testing
