@@ -1,11 +1,13 @@
 #include <ZelUtils/Stream.h>
 
-#include <unicode/ustring.h>
+#include <Internal/NativePath.h>
+#include <SystemIO/Path.h>
 
 #include <algorithm>
 #include <cerrno>
 #include <cstdint>
 #include <cstring>
+#include <random>
 #include <utility>
 
 #include <fcntl.h>
@@ -33,25 +35,6 @@ bool Stream::Write(const void* data, std::size_t size) {
 bool Stream::Flush() { return m_impl && m_impl->Flush(); }
 
 namespace {
-
-// The UTF-8 form of a path for the operating system; false when the path
-// cannot name a file (unpaired surrogates, an embedded NUL, empty).
-bool PathToUtf8(const ZelStringT<char16_t>& path, std::string& out) {
-  if (path.IsEmpty() || path.GetLength() > INT32_MAX / 3 ||
-      path.GetView().find(u'\0') != std::u16string_view::npos)
-    return false;
-  // Every UTF-16 unit becomes at most three UTF-8 bytes.
-  out.assign(path.GetLength() * 3, '\0');
-  int32_t length = 0;
-  UErrorCode error = U_ZERO_ERROR;
-  u_strToUTF8(out.data(), static_cast<int32_t>(out.size()), &length,
-              reinterpret_cast<const UChar*>(path.data()), static_cast<int32_t>(path.GetLength()),
-              &error);
-  if (U_FAILURE(error))
-    return false;
-  out.resize(static_cast<std::size_t>(length));
-  return true;
-}
 
 class FileImpl final : public Stream::Impl {
 public:
@@ -91,6 +74,14 @@ public:
 
   // Writes go straight to the file; nothing is buffered here.
   bool Flush() override { return true; }
+  // Waits until the written bytes are on the storage device.
+  bool SyncToDisk() noexcept {
+    int result;
+    do {
+      result = ::fsync(m_descriptor);
+    } while (result != 0 && errno == EINTR);
+    return result == 0;
+  }
   bool IsReadable() const noexcept override { return !m_writable; }
   bool IsWritable() const noexcept override { return m_writable; }
 
@@ -99,11 +90,9 @@ private:
   bool m_writable;
 };
 
-Stream OpenFile(const ZelStringT<char16_t>& path, bool forWriting) {
-  std::string nativePath;
-  if (!PathToUtf8(path, nativePath))
-    return Stream();
-  const int flags = forWriting ? O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC : O_RDONLY | O_CLOEXEC;
+// A stream on the file that `open` gives for `nativePath` and `flags`; the
+// unusable stream when it fails or the file is a folder.
+Stream OpenNative(const std::string& nativePath, int flags) {
   int descriptor;
   do {
     descriptor = ::open(nativePath.c_str(), flags, 0666);
@@ -116,7 +105,32 @@ Stream OpenFile(const ZelStringT<char16_t>& path, bool forWriting) {
     ::close(descriptor);
     return Stream();
   }
-  return Stream(std::make_shared<FileImpl>(descriptor, forWriting));
+  try {
+    return Stream(std::make_shared<FileImpl>(descriptor, (flags & O_ACCMODE) != O_RDONLY));
+  } catch (...) {
+    ::close(descriptor);
+    throw;
+  }
+}
+
+Stream OpenFile(const ZelStringT<char16_t>& path, bool forWriting) {
+  std::string nativePath;
+  if (!ZelPlatform::detail::ToNativePath(path, nativePath))
+    return Stream();
+  return OpenNative(nativePath,
+                    forWriting ? O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC : O_RDONLY | O_CLOEXEC);
+}
+
+// A hidden name that no other file in the folder is likely to have.
+std::u16string TemporaryName(std::random_device& random) {
+  static constexpr char16_t kDigits[] = u"0123456789abcdef";
+  std::u16string name = u".tmp-";
+  for (int i = 0; i < 4; ++i) {
+    unsigned bits = random();
+    for (int j = 0; j < 4; ++j, bits >>= 4)
+      name.push_back(kDigits[bits & 0xF]);
+  }
+  return name;
 }
 
 class MemoryImpl final : public Stream::Impl {
@@ -149,6 +163,39 @@ private:
 Stream FileStream::Create(const ZelStringT<char16_t>& path) { return OpenFile(path, true); }
 
 Stream FileStream::Open(const ZelStringT<char16_t>& path) { return OpenFile(path, false); }
+
+Stream FileStream::CreateTemporary(const ZelStringT<char16_t>& folder, ZelStringT<char16_t>& path) {
+  path = ZelStringT<char16_t>();
+  if (folder.IsEmpty())
+    return Stream();
+  std::random_device random;
+  for (int attempt = 0; attempt < 100; ++attempt) {
+    ZelStringT<char16_t> candidate = SystemIO::Path::Combine(folder, TemporaryName(random));
+    std::string nativePath;
+    if (!ZelPlatform::detail::ToNativePath(candidate, nativePath))
+      return Stream();
+    // O_EXCL never reuses a file, nor follows a link planted under the name.
+    Stream stream;
+    try {
+      stream = OpenNative(nativePath, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC);
+    } catch (...) {
+      ::unlink(nativePath.c_str()); // the file was made by this call
+      throw;
+    }
+    if (stream) {
+      path = std::move(candidate);
+      return stream;
+    }
+    if (errno != EEXIST)
+      return Stream();
+  }
+  return Stream();
+}
+
+bool FileStream::SyncToDisk(const Stream& stream) {
+  auto* file = dynamic_cast<FileImpl*>(stream.GetImpl());
+  return file && file->IsWritable() && file->SyncToDisk();
+}
 
 Stream MemoryStream::Create() { return Stream(std::make_shared<MemoryImpl>(std::string())); }
 

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <Json/Json.h>
+#include <SystemIO/FileSystem.h>
 #include <SystemIO/Path.h>
 #include <ZelPlatform/ZelString.h>
 #include <ZelPref/ConversionPolicy.h>
@@ -15,9 +16,11 @@
 #include <ZelUtils/TextStream.h>
 #include <ZelUtils/Variant.h>
 
+#include <Styles/FolderPresetManager.h>
 #include <Styles/Style.h>
 #include <Styles/StyleCategory.h>
 #include <Styles/StyleManager.h>
+#include <Styles/StylePresetManager.h>
 #include <Styles/StyleProperty.h>
 #include <Styles/StyleSheet.h>
 #include <Styles/StyleUtilities.h>
