@@ -83,9 +83,11 @@ TEST_F(StylePresetManagerTest, PresetsStandAlone) {
     const std::unique_ptr<Style> other(MakeStyle(u"other"));
     EXPECT_TRUE(replace ? manager.AddPreset(u"Linked", u"A", other.get(), true)
                         : manager.DeletePreset(u"Linked", u"A"));
+    // A replaced preset's followers follow its name; a deleted one's take
+    // over its values.
     const Style* b = manager.GetPreset(u"Linked", u"B");
-    EXPECT_EQ(b->GetParent(), nullptr);
-    EXPECT_EQ(b->GetProperty(kFont).Get<Text>(), Text(u"Mono"));
+    EXPECT_EQ(b->GetParent(), replace ? manager.GetPreset(u"Linked", u"A") : nullptr);
+    EXPECT_EQ(b->GetProperty(kFont).Get<Text>(), Text(replace ? u"Serif" : u"Mono"));
   }
 }
 

@@ -128,11 +128,9 @@ bool StylePresetManager::AddPreset(const SetName& setName, ZelStringT<char16_t> 
   // to a style of the source's sheet is cut.
   std::unique_ptr<Style> copy(new Style(*style));
   copy->RemoveAllDependencies();
-  std::unique_ptr<Style> previous(sheet->AddStyle(name, copy.release(), replace));
-  if (previous) {
-    CutReferencesTo(*sheet, previous.get());
-    previous.reset();
-  }
+  // A replaced preset is deleted; the sheet has already pointed the presets
+  // that referred to it at the new one.
+  delete sheet->AddStyle(name, copy.release(), replace);
   Save(setName);
   return true;
 }

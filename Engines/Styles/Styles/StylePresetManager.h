@@ -67,8 +67,9 @@ public:
   bool DoesPresetNameExist(const SetName& setName, ZelStringT<char16_t> name) const;
   // Stores a copy of `style` (not owned) as the preset `name`, folded with its
   // parents and free of every reference to other styles, then saves the set.
-  // With `replace` an existing preset of that name is deleted; without, it is
-  // kept and the copy dropped. False without a sheet, a style or a name;
+  // With `replace` an existing preset of that name is deleted (presets that
+  // referred to it, only a set read from a file can hold such, refer to the
+  // new one); without, it is kept and the copy dropped. False without a sheet, a style or a name;
   // otherwise true whatever the save gives, whose failure keeps the edit.
   bool AddPreset(const SetName& setName, ZelStringT<char16_t> name, const Style* style,
                  bool replace);
