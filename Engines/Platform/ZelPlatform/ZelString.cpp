@@ -113,6 +113,55 @@ void ReplaceUnpairedSurrogates(std::u16string_view text, std::u16string& out) {
   }
 }
 
+void FoldCaseUtf16(std::u16string_view text, std::u16string& out) {
+  out.resize(text.size());
+  std::size_t i = 0;
+  for (; i < text.size(); ++i) {
+    const char16_t c = text[i];
+    if (c >= 0x80)
+      break;
+    out[i] = static_cast<char16_t>(FoldAscii(c));
+  }
+  if (i == text.size())
+    return;
+  // Beyond ASCII, ICU folds the rest (after repairing unpaired surrogates).
+  std::u16string rest;
+  std::u16string_view source = text.substr(i);
+  if (HasUnpairedSurrogate(source)) {
+    ReplaceUnpairedSurrogates(source, rest);
+    source = rest;
+  }
+  assert(source.size() <= static_cast<std::size_t>(std::numeric_limits<int32_t>::max() / 3));
+  // Full folding grows a text by at most three times.
+  std::u16string folded(source.size() * 3, u'\0');
+  UErrorCode status = U_ZERO_ERROR;
+  const int32_t length =
+      u_strFoldCase(folded.data(), static_cast<int32_t>(folded.size()), source.data(),
+                    static_cast<int32_t>(source.size()), U_FOLD_CASE_DEFAULT, &status);
+  out.resize(i);
+  if (U_FAILURE(status))
+    out.append(source); // cannot happen with a large enough buffer
+  else
+    out.append(folded.data(), static_cast<std::size_t>(length));
+}
+
+int CompareCodePointOrder(std::u16string_view a, std::u16string_view b) noexcept {
+  const std::size_t common = a.size() < b.size() ? a.size() : b.size();
+  for (std::size_t i = 0; i < common; ++i) {
+    char16_t x = a[i], y = b[i];
+    if (x == y)
+      continue;
+    // Units from U+D800 up: surrogates (code points above U+FFFF) must sort
+    // after U+E000..U+FFFF, so those are moved below them.
+    if (x >= 0xD800 && y >= 0xD800) {
+      x = static_cast<char16_t>(x >= 0xE000 ? x - 0x800 : x + 0x2000);
+      y = static_cast<char16_t>(y >= 0xE000 ? y - 0x800 : y + 0x2000);
+    }
+    return x < y ? -1 : 1;
+  }
+  return a.size() == b.size() ? 0 : (a.size() < b.size() ? -1 : 1);
+}
+
 int CompareNoCaseUtf16(std::u16string_view a, std::u16string_view b) {
   return CompareFoldingAsciiPrefix(a, b, FoldedCompare);
 }

@@ -33,6 +33,14 @@ ZEL_API std::pair<std::size_t, std::size_t> TrimBoundsUtf8(std::string_view text
 // printf format attribute: FormatInternal always forwards a non-literal format,
 // which would trip -Wformat-security in hosts for calls without arguments.
 ZEL_API std::string FormatAscii(const char* format, ...);
+// `out` becomes the full case folding of `text`, with every unpaired
+// surrogate taken as U+FFFD: two texts compare equal by CompareNoCase exactly
+// when their foldings are equal, and CompareNoCase orders them as
+// CompareCodePointOrder orders their foldings.
+ZEL_API void FoldCaseUtf16(std::u16string_view text, std::u16string& out);
+// Code point order of two UTF-16 texts (which differs from code unit order
+// where surrogates meet units above them); <0, 0 or >0.
+ZEL_API int CompareCodePointOrder(std::u16string_view a, std::u16string_view b) noexcept;
 // Whether `text` holds a high surrogate not followed by a low one, or a low
 // surrogate not preceded by a high one.
 bool HasUnpairedSurrogate(std::u16string_view text) noexcept;

@@ -13,6 +13,7 @@
 #include <cstdint>
 #include <iterator>
 #include <memory>
+#include <typeinfo>
 #include <unordered_map>
 #include <utility>
 
@@ -42,6 +43,12 @@ int TruncateVersion(double number) {
   if (truncated >= static_cast<double>(INT_MAX))
     return INT_MAX;
   return static_cast<int>(truncated);
+}
+
+// Grows `values` geometrically so that one more push_back cannot throw.
+template <class T> void MakeRoomForOne(std::vector<T>& values) {
+  if (values.size() == values.capacity())
+    values.reserve(values.size() * 2 + 8);
 }
 
 } // namespace
@@ -175,13 +182,177 @@ private:
   std::vector<const Style*> m_chain; // scratch of Load
 };
 
+// The sheet's styles by name and by pointer. A name is case-folded once, when
+// it is filed, and looked up by a hash of its folding, so finding a style
+// costs one folding of the asked name whatever the sheet's size. Name order
+// is a sorted list that new names join when the order is next asked for.
+class StyleIndex {
+public:
+  struct Entry {
+    ZelStringT<char16_t> name; // as spelled when filed or last re-spelled
+    std::u16string folded;     // never changes while the entry is filed
+    Style* style;
+    bool listed = true; // in the name index (and so in name order)
+    bool erased = false;
+  };
+
+  // The entry filed under `name` in any letter case, or null.
+  Entry* Find(std::u16string_view name) const {
+    thread_local std::u16string folded;
+    ZelPlatform::detail::FoldCaseUtf16(name, folded);
+    const auto found = m_byName.find(folded);
+    return found == m_byName.end() ? nullptr : found->second;
+  }
+  // The entry of `style`, also when its name was dropped; null for null.
+  Entry* Find(const Style* style) const {
+    const auto found = m_byStyle.find(style);
+    return found == m_byStyle.end() ? nullptr : found->second;
+  }
+  std::size_t Size() const noexcept { return m_byName.size(); }
+  void Reserve(std::size_t count) {
+    m_byName.reserve(count);
+    m_byStyle.reserve(count);
+  }
+
+  // Files `style` under `name`, which no entry holds; `style` must not be in
+  // the index. Both indexes are unchanged when this throws.
+  Entry* Add(const ZelStringT<char16_t>& name, Style* style) {
+    auto entry = std::make_unique<Entry>(Entry{name, std::u16string(), style});
+    ZelPlatform::detail::FoldCaseUtf16(name.GetView(), entry->folded);
+    MakeRoomForOne(m_entries);
+    MakeRoomForOne(m_pending);
+    m_byName.emplace(entry->folded, entry.get());
+    if (style) {
+      try {
+        m_byStyle.emplace(style, entry.get());
+      } catch (...) {
+        m_byName.erase(entry->folded);
+        throw;
+      }
+    }
+    m_pending.push_back(entry.get());
+    m_entries.push_back(std::move(entry));
+    return m_entries.back().get();
+  }
+  // Files `style` in place of the entry's style, under `spelling`.
+  void Replace(Entry* entry, const ZelStringT<char16_t>& spelling, Style* style) {
+    ZelStringT<char16_t> name = spelling;
+    if (style)
+      m_byStyle.emplace(style, entry);
+    if (entry->style && entry->style != style)
+      m_byStyle.erase(entry->style);
+    entry->style = style;
+    entry->name = std::move(name);
+  }
+  // Takes the entry out of both indexes; the memory goes later.
+  void Erase(Entry* entry) {
+    if (entry->listed)
+      m_byName.erase(entry->folded);
+    if (entry->style)
+      m_byStyle.erase(entry->style);
+    entry->listed = false;
+    entry->erased = true;
+    // Erased entries are freed with the next ordering, or once they outnumber
+    // the live ones.
+    if (++m_erased > m_byStyle.size() + 16)
+      Ordered();
+  }
+  // Drops every name; the styles stay known by pointer.
+  void DropNames() {
+    for (const auto& entry : m_entries)
+      entry->listed = false;
+    m_byName.clear();
+    m_stale = true;
+  }
+  // The listed entries in name order.
+  const std::vector<Entry*>& Ordered() const {
+    if (m_pending.empty() && !m_stale && m_erased == 0)
+      return m_ordered;
+    const auto unlisted = [](const Entry* entry) { return !entry->listed; };
+    const auto less = [](const Entry* a, const Entry* b) {
+      return ZelPlatform::detail::CompareCodePointOrder(a->folded, b->folded) < 0;
+    };
+    m_ordered.erase(std::remove_if(m_ordered.begin(), m_ordered.end(), unlisted), m_ordered.end());
+    m_pending.erase(std::remove_if(m_pending.begin(), m_pending.end(), unlisted), m_pending.end());
+    std::sort(m_pending.begin(), m_pending.end(), less);
+    const std::size_t middle = m_ordered.size();
+    m_ordered.insert(m_ordered.end(), m_pending.begin(), m_pending.end());
+    std::inplace_merge(m_ordered.begin(), m_ordered.begin() + static_cast<std::ptrdiff_t>(middle),
+                       m_ordered.end(), less);
+    m_pending.clear();
+    m_stale = false;
+    if (m_erased) {
+      m_entries.erase(std::remove_if(m_entries.begin(), m_entries.end(),
+                                     [](const auto& entry) { return entry->erased; }),
+                      m_entries.end());
+      m_erased = 0;
+    }
+    return m_ordered;
+  }
+  // Every style, listed ones in name order first, then those known only by
+  // pointer; the index is left empty.
+  std::vector<Style*> TakeStyles() {
+    std::vector<Style*> styles;
+    styles.reserve(m_entries.size());
+    for (const Entry* entry : Ordered())
+      styles.push_back(entry->style);
+    for (const auto& entry : m_entries)
+      if (!entry->listed && !entry->erased && entry->style)
+        styles.push_back(entry->style);
+    m_byName.clear();
+    m_byStyle.clear();
+    m_ordered.clear();
+    m_entries.clear();
+    return styles;
+  }
+
+private:
+  mutable std::vector<std::unique_ptr<Entry>> m_entries; // owns every entry
+  mutable std::vector<Entry*> m_ordered;                 // listed entries in name order
+  mutable std::vector<Entry*> m_pending;                 // filed since the last ordering
+  mutable bool m_stale = false;                          // names dropped since then
+  mutable std::size_t m_erased = 0;
+  std::unordered_map<std::u16string_view, Entry*> m_byName;
+  std::unordered_map<const Style*, Entry*> m_byStyle;
+};
+
 } // namespace detail
+
+namespace {
+
+// Files `style` under `name` with one search of the index. `previous`
+// receives the style replaced (detached, not destroyed). Returns the entry
+// filed under `name` and whether `style` went in; when it did not (a clash
+// without `replace`), `style` is still the caller's to destroy.
+std::pair<detail::StyleIndex::Entry*, bool> FileStyle(detail::StyleIndex& index,
+                                                      const ZelStringT<char16_t>& name,
+                                                      Style* style, bool replace,
+                                                      Style*& previous) {
+  previous = nullptr;
+  detail::StyleIndex::Entry* found = index.Find(name.GetView());
+  if (found && !replace)
+    return {found, false};
+  try {
+    if (!found)
+      return {index.Add(name, style), true};
+    // Replacing re-files the name under the caller's spelling.
+    previous = found->style;
+    index.Replace(found, name, style);
+    return {found, true};
+  } catch (...) {
+    // The sheet owns the offered style even when it could not be filed.
+    previous = nullptr;
+    delete style;
+    throw;
+  }
+}
+
+} // namespace
 
 IStyleSheetDuplicationContext::~IStyleSheetDuplicationContext() = default;
 
 StyleSheet::StyleSheet()
-    : m_styles(new NameIndex), m_names(new PointerIndex),
-      m_version(GetStyleManager().GetCurrentVersion()) {}
+    : m_index(new detail::StyleIndex), m_version(GetStyleManager().GetCurrentVersion()) {}
 
 StyleSheet::~StyleSheet() { Clear(); }
 
@@ -191,46 +362,34 @@ void StyleSheet::SetExternalID(const ZelStringT<char16_t>& id) { m_externalID = 
 
 void StyleSheet::Clear() {
   m_version = GetStyleManager().GetCurrentVersion();
-  NameIndex styles;
-  styles.swap(*m_styles);
-  PointerIndex names;
-  names.swap(*m_names);
-  for (auto& entry : styles) {
-    names.erase(entry.second);
-    delete entry.second;
-  }
-  // Styles known only by pointer (MergeIn dropped their names) are the
-  // sheet's too.
-  for (auto& entry : names)
-    delete entry.first;
+  // Styles known only by pointer (MergeIn dropped their names) come last;
+  // they are the sheet's too.
+  for (Style* style : m_index->TakeStyles())
+    delete style;
 }
 
 Style* StyleSheet::AddStyle(const ZelStringT<char16_t>& name, Style* style, bool replace) {
   if (style) {
-    const auto filedAs = m_names->find(style);
-    if (filedAs != m_names->end()) {
-      const auto found = m_styles->find(name);
-      if (found != m_styles->end() && found->second == style) {
+    if (detail::StyleIndex::Entry* filedAs = m_index->Find(style)) {
+      if (m_index->Find(name.GetView()) == filedAs) {
         // Already filed under this name: destroying or handing it back would
         // leave the sheet listing a style it no longer has.
-        if (replace) {
-          const ZelStringT<char16_t> current = found->first;
-          RenameStyle(current, name);
-        }
+        if (replace)
+          m_index->Replace(filedAs, name, style);
         return nullptr;
       }
       // Filed under another name: it leaves that one, so that the sheet never
       // lists one style twice.
-      DetachByPointerEntry(filedAs);
+      m_index->Erase(filedAs);
     }
   }
   Style* previous = nullptr;
-  const auto [entry, filed] = FileStyle(name, style, replace, previous);
+  const auto [entry, filed] = FileStyle(*m_index, name, style, replace, previous);
   if (!filed) {
     // The style already in the sheet wins; whatever referred to the offered
     // one follows the name.
     if (style) {
-      Redirect({{style, entry->second}});
+      Redirect({{style, entry->style}});
       delete style;
     }
     return nullptr;
@@ -238,52 +397,6 @@ Style* StyleSheet::AddStyle(const ZelStringT<char16_t>& name, Style* style, bool
   if (previous)
     Redirect({{previous, style}});
   return previous;
-}
-
-std::pair<StyleSheet::NameIndex::iterator, bool>
-StyleSheet::FileStyle(const ZelStringT<char16_t>& name, Style* style, bool replace,
-                      Style*& previous) {
-  previous = nullptr;
-  const auto found = m_styles->lower_bound(name);
-  const bool present = found != m_styles->end() && !m_styles->key_comp()(name, found->first);
-  if (present && !replace)
-    return {found, false};
-  Style* const removed = present ? found->second : nullptr;
-  NameIndex::iterator filed;
-  try {
-    // Everything that allocates comes before the first change, so that a
-    // failure leaves both indexes as they were.
-    ZelStringT<char16_t> key = name;
-    ZelStringT<char16_t> spelling = name;
-    const auto [pointerEntry, newPointerEntry] = m_names->try_emplace(style);
-    if (present) {
-      // Replacing: the entry is taken out and put back under the caller's
-      // spelling, which is what removing and adding again amounts to.
-      const auto next = std::next(found);
-      auto node = m_styles->extract(found);
-      node.key() = std::move(key);
-      node.mapped() = style;
-      filed = m_styles->insert(next, std::move(node));
-      if (removed != style)
-        m_names->erase(removed);
-    } else {
-      try {
-        filed = m_styles->emplace_hint(found, std::move(key), style);
-      } catch (...) {
-        if (newPointerEntry)
-          m_names->erase(pointerEntry);
-        throw;
-      }
-    }
-    pointerEntry->second = std::move(spelling);
-  } catch (...) {
-    // The sheet owns the offered style even when it could not be filed.
-    if (style != removed)
-      delete style;
-    throw;
-  }
-  previous = removed;
-  return {filed, true};
 }
 
 void StyleSheet::Redirect(const std::map<Style*, Style*>& heirs) {
@@ -302,8 +415,7 @@ void StyleSheet::Redirect(const std::map<Style*, Style*>& heirs) {
   const StyleSpan doomed(olds, true);
   const bool anyNull = std::any_of(heirs.begin(), heirs.end(),
                                    [](const auto& pair) { return pair.second == nullptr; });
-  for (auto& entry : *m_styles) {
-    Style* style = entry.second;
+  for (Style* style : GetStyles()) {
     if (!style)
       continue;
     if (anyNull || std::binary_search(heirLines.begin(), heirLines.end(), style))
@@ -320,31 +432,19 @@ bool StyleSheet::AcceptParent(Style& child, Style& parent) const {
 }
 
 Style* StyleSheet::RemoveStyle(const ZelStringT<char16_t>& name) {
-  const auto found = m_styles->find(name);
-  if (found == m_styles->end())
+  detail::StyleIndex::Entry* entry = m_index->Find(name.GetView());
+  if (!entry)
     return nullptr;
-  Style* style = found->second;
-  m_names->erase(style);
-  m_styles->erase(found);
-  return style;
-}
-
-Style* StyleSheet::DetachByPointerEntry(PointerIndex::iterator entry) {
-  Style* style = const_cast<Style*>(entry->first);
-  const auto found = m_styles->find(entry->second);
-  if (found != m_styles->end() && found->second == style)
-    m_styles->erase(found);
-  m_names->erase(entry);
+  Style* style = entry->style;
+  m_index->Erase(entry);
   return style;
 }
 
 bool StyleSheet::RemoveStyle(Style* style) {
-  if (!style)
+  detail::StyleIndex::Entry* entry = style ? m_index->Find(style) : nullptr;
+  if (!entry)
     return false;
-  const auto found = m_names->find(style);
-  if (found == m_names->end())
-    return false;
-  DetachByPointerEntry(found);
+  m_index->Erase(entry);
   return true;
 }
 
@@ -353,34 +453,32 @@ void StyleSheet::DeleteStyles(StyleSpan styles) {
   // that no surviving style is left pointing at a destroyed one.
   std::vector<Style*> storage;
   const StyleSpan doomed = ZelUtils::MakeSearchable(styles, storage);
-  for (auto& entry : *m_styles)
-    if (entry.second)
-      entry.second->RemoveDependency(doomed, true);
+  for (Style* style : GetStyles())
+    if (style)
+      style->RemoveDependency(doomed, true);
   for (Style* style : styles) {
-    if (!style)
-      continue;
-    const auto found = m_names->find(style);
-    if (found == m_names->end())
+    detail::StyleIndex::Entry* entry = style ? m_index->Find(style) : nullptr;
+    if (!entry)
       continue; // foreign styles are left to their owner
-    delete DetachByPointerEntry(found);
+    m_index->Erase(entry);
+    delete style;
   }
 }
 
 void StyleSheet::RenameStyle(const ZelStringT<char16_t>& oldName,
                              const ZelStringT<char16_t>& newName) {
-  if (oldName.CompareNoCase(newName) != 0 && m_styles->count(newName) != 0)
+  detail::StyleIndex::Entry* entry = m_index->Find(oldName.GetView());
+  if (!entry)
     return;
-  const auto found = m_styles->find(oldName);
-  if (found == m_styles->end())
-    return;
-  // Allocations first, so that a failure leaves both indexes as they were.
-  ZelStringT<char16_t> nameKey = newName;
-  ZelStringT<char16_t> nameValue = newName;
-  const auto pointerEntry = m_names->try_emplace(found->second).first;
-  auto node = m_styles->extract(found);
-  node.key() = std::move(nameKey);
-  m_styles->insert(std::move(node));
-  pointerEntry->second = std::move(nameValue);
+  detail::StyleIndex::Entry* taken = m_index->Find(newName.GetView());
+  if (taken == entry) {
+    // Only the letter case changes: the name is re-spelled in place.
+    m_index->Replace(entry, newName, entry->style);
+  } else if (!taken) {
+    Style* style = entry->style;
+    m_index->Erase(entry);
+    m_index->Add(newName, style);
+  }
 }
 
 void StyleSheet::MergeIn(StyleSheet& other, bool replace) {
@@ -388,23 +486,26 @@ void StyleSheet::MergeIn(StyleSheet& other, bool replace) {
   // hosts rely on, kept as it is. Each style goes back into this sheet and
   // whatever AddStyle hands back is destroyed. A snapshot keeps the walk
   // valid while AddStyle changes the index.
-  const std::vector<std::pair<ZelStringT<char16_t>, Style*>> own(m_styles->begin(),
-                                                                 m_styles->end());
+  std::vector<std::pair<ZelStringT<char16_t>, Style*>> own;
+  own.reserve(m_index->Size());
+  for (const detail::StyleIndex::Entry* entry : m_index->Ordered())
+    own.emplace_back(entry->name, entry->style);
   for (const auto& entry : own)
     delete AddStyle(entry.first, entry.second, replace);
-  other.m_styles->clear();
+  other.m_index->DropNames();
 }
 
 Style* StyleSheet::GetStyle(const ZelStringT<char16_t>& name) const {
-  const auto found = m_styles->find(name);
-  return found == m_styles->end() ? nullptr : found->second;
+  const detail::StyleIndex::Entry* entry = m_index->Find(name.GetView());
+  return entry ? entry->style : nullptr;
 }
 
 std::vector<Style*> StyleSheet::GetStyles() const {
+  const std::vector<detail::StyleIndex::Entry*>& ordered = m_index->Ordered();
   std::vector<Style*> styles;
-  styles.reserve(m_styles->size());
-  for (const auto& entry : *m_styles)
-    styles.push_back(entry.second);
+  styles.reserve(ordered.size());
+  for (const detail::StyleIndex::Entry* entry : ordered)
+    styles.push_back(entry->style);
   return styles;
 }
 
@@ -420,32 +521,36 @@ StyleSheet::GetStylesByName(const std::vector<ZelStringT<char16_t>>& names) cons
 
 std::vector<Style*> StyleSheet::GetStylesByCategory(const PropertyKey& category) const {
   std::vector<Style*> styles;
-  for (const auto& entry : *m_styles)
-    if (entry.second && entry.second->GetCategoryName() == category)
-      styles.push_back(entry.second);
+  for (const detail::StyleIndex::Entry* entry : m_index->Ordered())
+    if (entry->style && entry->style->GetCategoryName() == category)
+      styles.push_back(entry->style);
   return styles;
 }
 
 ZelStringT<char16_t> StyleSheet::GetStyleName(const Style* style) const {
-  if (!style)
-    return ZelStringT<char16_t>();
-  const auto found = m_names->find(style);
-  return found == m_names->end() ? ZelStringT<char16_t>() : found->second;
+  const ZelStringT<char16_t>* name = FindStyleName(style);
+  return name ? *name : ZelStringT<char16_t>();
+}
+
+const ZelStringT<char16_t>* StyleSheet::FindStyleName(const Style* style) const {
+  const detail::StyleIndex::Entry* entry = style ? m_index->Find(style) : nullptr;
+  return entry ? &entry->name : nullptr;
 }
 
 std::vector<ZelStringT<char16_t>> StyleSheet::GetStyleNames() const {
+  const std::vector<detail::StyleIndex::Entry*>& ordered = m_index->Ordered();
   std::vector<ZelStringT<char16_t>> names;
-  names.reserve(m_styles->size());
-  for (const auto& entry : *m_styles)
-    names.push_back(entry.first);
+  names.reserve(ordered.size());
+  for (const detail::StyleIndex::Entry* entry : ordered)
+    names.push_back(entry->name);
   return names;
 }
 
 std::vector<ZelStringT<char16_t>> StyleSheet::GetStyleNames(const PropertyKey& category) const {
   std::vector<ZelStringT<char16_t>> names;
-  for (const auto& entry : *m_styles)
-    if (entry.second && entry.second->GetCategoryName() == category)
-      names.push_back(entry.first);
+  for (const detail::StyleIndex::Entry* entry : m_index->Ordered())
+    if (entry->style && entry->style->GetCategoryName() == category)
+      names.push_back(entry->name);
   return names;
 }
 
@@ -453,19 +558,19 @@ StyleSheet::NameIndex StyleSheet::GetChildStyles(const Style* parent) const {
   NameIndex children;
   if (!parent)
     return children;
-  for (const auto& entry : *m_styles)
-    if (entry.second && entry.second->GetParent() == parent)
-      children.emplace_hint(children.end(), entry.first, entry.second);
+  for (const detail::StyleIndex::Entry* entry : m_index->Ordered())
+    if (entry->style && entry->style->GetParent() == parent)
+      children.emplace_hint(children.end(), entry->name, entry->style);
   return children;
 }
 
 void StyleSheet::GenerateCategoryStyleMap(CategoryStyleMap& out) const {
   out.clear();
-  for (const auto& entry : *m_styles) {
-    if (!entry.second)
+  for (const detail::StyleIndex::Entry* entry : m_index->Ordered()) {
+    if (!entry->style)
       continue;
-    NameIndex& styles = out[entry.second->GetCategoryName()];
-    styles.emplace_hint(styles.end(), entry.first, entry.second);
+    NameIndex& styles = out[entry->style->GetCategoryName()];
+    styles.emplace_hint(styles.end(), entry->name, entry->style);
   }
 }
 
@@ -477,11 +582,11 @@ Style* StyleSheet::GetExternalStyleAlias(const ZelStringT<char16_t>& externalID,
                                          const ZelStringT<char16_t>& externalName) const {
   if (externalID.IsEmpty() || externalName.IsEmpty())
     return nullptr;
-  for (const auto& entry : *m_styles) {
-    const Style* style = entry.second;
+  for (const detail::StyleIndex::Entry* entry : m_index->Ordered()) {
+    const Style* style = entry->style;
     if (style && style->GetExternalID().Compare(externalID, 0) == 0 &&
         style->GetExternalName().Compare(externalName, 0) == 0)
-      return entry.second;
+      return entry->style;
   }
   return nullptr;
 }
@@ -495,7 +600,7 @@ ZelStringT<char16_t> StyleSheet::GetUnusedStyleName(const ZelStringT<char16_t>& 
     candidate = manager.GetCategory(key)->GetUIName() + u" 1";
   }
   return ZelUtils::String::FindUnusedName(candidate, [this](const ZelStringT<char16_t>& name) {
-    return m_styles->find(name) != m_styles->end();
+    return m_index->Find(name.GetView()) != nullptr;
   });
 }
 
@@ -506,28 +611,41 @@ void StyleSheet::CopyContentsFrom(const StyleSheet& source,
   source.ExportToString(text, true);
   ImportFromString(text, true);
   if (context)
-    for (const auto& entry : *m_styles)
-      context->OnStyleDuplicated(entry.second, 0);
+    for (Style* style : GetStyles())
+      context->OnStyleDuplicated(style, 0);
   m_version = source.m_version;
 }
 
+namespace {
+
+// The filed styles by category (in key order), each list in name order.
+std::map<PropertyKey, std::vector<const detail::StyleIndex::Entry*>>
+GroupByCategory(const detail::StyleIndex& index) {
+  std::map<PropertyKey, std::vector<const detail::StyleIndex::Entry*>> categories;
+  for (const detail::StyleIndex::Entry* entry : index.Ordered())
+    if (entry->style)
+      categories[entry->style->GetCategoryName()].push_back(entry);
+  return categories;
+}
+
+} // namespace
+
 void StyleSheet::ExportJson(JsonValue& out, bool includeTemporary) const {
   Json::Object& document = out.Get<Json::Object>();
-  CategoryStyleMap categories;
-  GenerateCategoryStyleMap(categories);
+  const auto categories = GroupByCategory(*m_index);
   if (m_version > 0)
     document.AddValue(k_strVersion, Json::Value(m_version));
   if (!m_externalID.IsEmpty())
     document.AddValue(k_strExternalID, Json::Value(m_externalID));
-  for (const auto& category : categories) {
+  for (const auto& [category, entries] : categories) {
     Json::Object styles;
-    styles.Reserve(category.second.size());
-    for (const auto& [name, style] : category.second) {
+    styles.Reserve(entries.size());
+    for (const detail::StyleIndex::Entry* entry : entries) {
       Json::Value json;
-      style->Serialize(*this, json, includeTemporary);
-      styles.AddValue(name, std::move(json));
+      entry->style->Serialize(*this, json, includeTemporary);
+      styles.AddValue(entry->name, std::move(json));
     }
-    document.AddValue(category.first.GetString(), Json::Value(std::move(styles)));
+    document.AddValue(category.GetString(), Json::Value(std::move(styles)));
   }
 }
 
@@ -562,15 +680,15 @@ bool StyleSheet::ImportJson(Json::Object* document, bool replace) {
   // The name-index entry filed under each style member's name, in document
   // order. Import never erases an entry (a replacement re-files it), so the
   // second pass reads each entry instead of searching for the name again.
-  std::vector<const NameIndex::value_type*> filed;
+  std::vector<const detail::StyleIndex::Entry*> filed;
   // Styles that replacements took out of the sheet, with the entry of the
   // name each held. They are destroyed after the first pass, once every style
   // that referred to one refers to the style holding its name at that time.
-  std::vector<std::pair<Style*, const NameIndex::value_type*>> replaced;
+  std::vector<std::pair<Style*, const detail::StyleIndex::Entry*>> replaced;
   const auto repairReplaced = [this, &replaced] {
     std::map<Style*, Style*> heirs;
     for (const auto& [old, entry] : replaced)
-      heirs[old] = entry->second;
+      heirs[old] = entry->style;
     Redirect(heirs);
     for (const auto& old : replaced)
       delete old.first;
@@ -608,16 +726,21 @@ bool StyleSheet::ImportJson(Json::Object* document, bool replace) {
         continue;
       for (std::size_t j = 0; j < category->GetSize(); ++j) {
         category->GetValue(j).Get<Json::Object>(); // std::bad_cast for a non-object
-        std::unique_ptr<Style> style(new Style);
-        created.push_back(style.get());
+        // Room first, so that nothing below can throw once a style is out.
+        MakeRoomForOne(created);
+        MakeRoomForOne(filed);
+        MakeRoomForOne(replaced);
+        Style* style = new Style;
+        created.push_back(style);
         Style* previous = nullptr;
+        // FileStyle owns `style`, also when it throws.
         const auto [entry, isFiled] =
-            FileStyle(category->GetValueName(j), style.get(), replace, previous);
-        if (isFiled)
-          style.release();
+            FileStyle(*m_index, category->GetValueName(j), style, replace, previous);
+        if (!isFiled)
+          delete style;
         if (previous)
-          replaced.emplace_back(previous, &*entry);
-        filed.push_back(&*entry);
+          replaced.emplace_back(previous, entry);
+        filed.push_back(entry);
       }
     }
   } catch (...) {
@@ -643,7 +766,7 @@ bool StyleSheet::ImportJson(Json::Object* document, bool replace) {
       continue;
     const PropertyKey categoryKey(name);
     for (std::size_t j = 0; j < category->GetSize(); ++j) {
-      Style* style = filed[next++]->second;
+      Style* style = filed[next++]->style;
       if (!std::binary_search(created.begin(), created.end(), style))
         continue;
       style->SetCategory(categoryKey);
@@ -674,9 +797,36 @@ bool StyleSheet::ImportFromString(const ZelStringT<char16_t>& text, bool replace
 }
 
 void StyleSheet::ExportToString(ZelStringT<char16_t>& text, bool includeTemporary) const {
-  JsonValue value{Json::Object()};
-  ExportJson(value, includeTemporary);
-  text = Json::ValueToString(value, false);
+  if (typeid(*this) != typeid(StyleSheet)) {
+    // A derived sheet may write its own document: go through ExportJson.
+    JsonValue value{Json::Object()};
+    ExportJson(value, includeTemporary);
+    text = Json::ValueToString(value, false);
+    return;
+  }
+  // The same text as ExportJson's tree would give, written without the tree.
+  Json::Writer writer(false);
+  writer.StartObject();
+  if (m_version > 0) {
+    writer.Key(k_strVersion);
+    writer.Write(Json::Value(m_version));
+  }
+  if (!m_externalID.IsEmpty()) {
+    writer.Key(k_strExternalID);
+    writer.String(m_externalID.GetView());
+  }
+  JsonValue scratch;
+  for (const auto& [category, entries] : GroupByCategory(*m_index)) {
+    writer.Key(category.GetView());
+    writer.StartObject();
+    for (const detail::StyleIndex::Entry* entry : entries) {
+      writer.Key(entry->name.GetView());
+      entry->style->WriteJson(*this, writer, includeTemporary, scratch);
+    }
+    writer.EndObject();
+  }
+  writer.EndObject();
+  text = writer.TakeText();
 }
 
 bool StyleSheet::Export(ZelUtils::Stream& stream) const {

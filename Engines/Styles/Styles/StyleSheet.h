@@ -19,6 +19,7 @@ namespace Styles {
 
 namespace detail {
 class ParentForest;
+class StyleIndex;
 } // namespace detail
 
 // Told about every style that StyleSheet::CopyContentsFrom creates.
@@ -46,8 +47,6 @@ public:
   // case are the same key.
   using NameIndex =
       std::map<ZelStringT<char16_t>, Style*, ZelUtils::String::LessThanCaseInsensitive>;
-  // Styles ordered by address, mapped to the name they are filed under.
-  using PointerIndex = std::map<const Style*, ZelStringT<char16_t>>;
   // Styles of one category by name, ordered ignoring letter case.
   using CategoryStyleMap = std::map<PropertyKey, NameIndex>;
 
@@ -174,26 +173,20 @@ public:
 private:
   friend class Style;
 
-  // Files `style` under `name` with one search of the name index. `previous`
-  // receives the style replaced (detached, not destroyed). Returns the entry
-  // filed under `name` and whether `style` went in; when it did not (a clash
-  // without `replace`), `style` is still the caller's to destroy.
-  std::pair<NameIndex::iterator, bool> FileStyle(const ZelStringT<char16_t>& name, Style* style,
-                                                 bool replace, Style*& previous);
-  // Detaches the style that `entry` records, from both indexes.
-  Style* DetachByPointerEntry(PointerIndex::iterator entry);
   // Makes every style of the sheet that refers to an old style of `heirs`
   // (styles no longer in the sheet) refer to its heir instead; a style that
   // an heir is or inherits from, or every one when an heir is null, takes
   // over the old style's values instead.
   void Redirect(const std::map<Style*, Style*>& heirs);
+  // The name `style` is filed under, not copied; null when it is not filed.
+  const ZelStringT<char16_t>* FindStyleName(const Style* style) const;
   // Whether `child` may inherit from `parent`: false when `child` is `parent`
   // or one of its ancestors. During an import the answer takes amortised
   // logarithmic time and the new link is recorded.
   bool AcceptParent(Style& child, Style& parent) const;
 
-  std::unique_ptr<NameIndex> m_styles;
-  std::unique_ptr<PointerIndex> m_names;
+  // The styles by name, in name order and by pointer.
+  std::unique_ptr<detail::StyleIndex> m_index;
   // The parent links of the import under way, or null.
   mutable detail::ParentForest* m_import = nullptr;
   int m_version;

@@ -88,14 +88,23 @@ TEST(StringTest, FindUnusedName) {
 // The name index of a sheet relies on the comparator being a strict weak
 // order whose equivalence is exactly CompareNoCase == 0.
 TEST(StringTest, LessThanCaseInsensitiveAgreesWithCompareNoCase) {
-  const std::vector<String16> sample = {u"Red",    u"red 1",   u"blue",        u"\u212A",
-                                        u"k",      u"STRASSE", u"stra\u00DFe", u"\u00C4",
-                                        u"\u00E4", u"_x",      u"[x",          u""};
+  const std::vector<String16> sample = {
+      u"Red",    u"red 1",      u"blue",        u"\u212A",
+      u"k",      u"STRASSE",    u"stra\u00DFe", u"\u00C4",
+      u"\u00E4", u"_x",         u"[x",          u"",
+      u"\uFF21", u"\U0001F600", u"\uFFFD",      String16(std::u16string(1, char16_t(0xD800)))};
   const LessThanCaseInsensitive less;
+  const auto sign = [](int value) { return (value > 0) - (value < 0); };
+  std::u16string foldedA, foldedB;
   for (const String16& a : sample) {
     for (const String16& b : sample) {
       SCOPED_TRACE(Narrow(a) + " vs " + Narrow(b));
       EXPECT_EQ(less(a, b), a.CompareNoCase(b) < 0);
+      // Folding once and comparing code points gives the same order.
+      ZelPlatform::detail::FoldCaseUtf16(a.GetView(), foldedA);
+      ZelPlatform::detail::FoldCaseUtf16(b.GetView(), foldedB);
+      EXPECT_EQ(sign(ZelPlatform::detail::CompareCodePointOrder(foldedA, foldedB)),
+                sign(a.CompareNoCase(b)));
     }
   }
   std::map<String16, int, LessThanCaseInsensitive> names{{u"Stra\u00DFe", 1}};
