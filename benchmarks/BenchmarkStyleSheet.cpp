@@ -1,25 +1,65 @@
-// Import and export throughput of a style sheet document, next to the raw
-// RapidJSON parse and write of the same text as the floor to compare with.
-// Sizes are numbers of styles; bytes are UTF-16 code units times two. Each
-// size runs on a plain document and on one where a fifth of the styles own a
-// substyle and a twentieth a list of two to four substyles.
-#include <Styles/StyleManager.h>
-#include <Styles/StyleProperty.h>
-#include <Styles/StyleSheet.h>
-#include <Styles/StyleUtilities.h>
+// Sheet documents at 1k, 10k and 100k styles, each beside a plain baseline on
+// the same data in the same run: import against RapidJSON's UTF-16 DOM parse,
+// export against RapidJSON's Writer over that DOM, DeleteStyles of a fixed set
+// at two sizes, a lookup answered by the 4th parent against the same walk over
+// plain structs, and the memory one import takes at its peak and keeps. The
+// documents model a word processor: 4 to 12 properties a style, 70% of styles
+// with a parent, a third of the names non-ASCII; the "substyles" variant gives
+// a fifth of the styles a character substyle and a twentieth a list of two to
+// four. After the runs a summary prints every ratio the project tracks.
+#include <Styles/Styles.h>
 
 #include <ZelPref/ConversionPolicy.h>
 
 #include <benchmark/benchmark.h>
+#include <malloc.h>
 #include <rapidjson/document.h>
 #include <rapidjson/encodings.h>
-#include <rapidjson/reader.h>
 #include <rapidjson/stringbuffer.h>
 #include <rapidjson/writer.h>
 
+#include <algorithm>
+#include <atomic>
 #include <cstdint>
+#include <cstdio>
+#include <cstdlib>
+#include <map>
 #include <memory>
+#include <new>
+#include <random>
+#include <string>
 #include <vector>
+
+// Every allocation of the process goes through these, so that the bytes in
+// use and their peak can be read around one import.
+namespace {
+std::atomic<std::size_t> g_bytesInUse{0};
+std::atomic<std::size_t> g_peakBytes{0};
+
+void* Allocate(std::size_t size) {
+  void* memory = std::malloc(size ? size : 1);
+  if (!memory)
+    throw std::bad_alloc();
+  const std::size_t now = g_bytesInUse += malloc_usable_size(memory);
+  std::size_t peak = g_peakBytes.load(std::memory_order_relaxed);
+  while (now > peak && !g_peakBytes.compare_exchange_weak(peak, now))
+    ;
+  return memory;
+}
+void Release(void* memory) noexcept {
+  if (memory) {
+    g_bytesInUse -= malloc_usable_size(memory);
+    std::free(memory);
+  }
+}
+} // namespace
+
+void* operator new(std::size_t size) { return Allocate(size); }
+void* operator new[](std::size_t size) { return Allocate(size); }
+void operator delete(void* memory) noexcept { Release(memory); }
+void operator delete[](void* memory) noexcept { Release(memory); }
+void operator delete(void* memory, std::size_t) noexcept { Release(memory); }
+void operator delete[](void* memory, std::size_t) noexcept { Release(memory); }
 
 namespace {
 
@@ -28,79 +68,109 @@ using Styles::Style;
 using Styles::StyleSheet;
 using Text = ZelStringT<char16_t>;
 using Utf16 = rapidjson::UTF16<char16_t>;
+using ZelUtils::Any;
 
-const PropertyKey kParagraph(u"benchParagraph");
-const PropertyKey kCharacter(u"benchCharacter");
-const PropertyKey kSize(u"fontSize");
-const PropertyKey kFont(u"fontName");
-const PropertyKey kColour(u"colour");
-const PropertyKey kSpacing(u"spaceAfter");
-const PropertyKey kRuns(u"runs");
+const PropertyKey kParagraph(u"paragraph");
+const PropertyKey kCharacter(u"character");
+const PropertyKey kCells(u"cells");
 
-bool IsNumber(const ZelUtils::Any& value) { return value.GetIf<double>() != nullptr; }
-bool IsText(const ZelUtils::Any& value) { return value.GetIf<Text>() != nullptr; }
+struct PropertySpec {
+  const char16_t* name;
+  bool number;
+};
+// The properties both categories register, in the order styles set them.
+const PropertySpec kProperties[] = {
+    {u"fontName", false},  {u"fontSize", true},   {u"colour", false},    {u"spaceBefore", true},
+    {u"spaceAfter", true}, {u"lineHeight", true}, {u"indentLeft", true}, {u"indentRight", true},
+    {u"alignment", false}, {u"bold", true},       {u"italic", true},     {u"tracking", true},
+};
 
-// Registers the two categories once for the whole program.
+bool IsNumber(const Any& value) { return value.GetIf<double>() != nullptr; }
+bool IsText(const Any& value) { return value.GetIf<Text>() != nullptr; }
+
 void RegisterCategories() {
   static const bool registered = [] {
     Styles::StyleManager& manager = Styles::GetStyleManager();
     manager.SetCurrentVersion(1);
     for (const PropertyKey& category : {kParagraph, kCharacter}) {
       manager.RegisterCategory(category, category.GetString(), false, false);
-      for (const PropertyKey& number : {kSize, kSpacing})
-        manager.RegisterProperty(category, number,
-                                 new Styles::StyleProperty(ZelUtils::Any(0.0),
-                                                           new ZelPref::NumberConversionPolicy,
-                                                           &IsNumber));
-      for (const PropertyKey& text : {kFont, kColour})
-        manager.RegisterProperty(category, text,
-                                 new Styles::StyleProperty(ZelUtils::Any(Text()),
-                                                           new ZelPref::TextConversionPolicy,
-                                                           &IsText));
-      // One character substyle (keyed by its category) and a list of them.
-      Styles::RegisterSubstyleSet(category, kCharacter);
-      manager.RegisterProperty(category, kRuns, new Styles::StyleArrayProperty(kCharacter));
+      for (const PropertySpec& property : kProperties) {
+        if (property.number)
+          manager.RegisterProperty(
+              category, property.name,
+              new Styles::StyleProperty(Any(0.0), new ZelPref::NumberConversionPolicy, &IsNumber));
+        else
+          manager.RegisterProperty(
+              category, property.name,
+              new Styles::StyleProperty(Any(Text()), new ZelPref::TextConversionPolicy, &IsText));
+      }
     }
+    Styles::RegisterSubstyleSet(kParagraph, kCharacter);
+    manager.RegisterProperty(kParagraph, kCells, new Styles::StyleArrayProperty(kCharacter));
     return true;
   }();
   (void)registered;
 }
 
-// A sheet of `count` styles in chains of ten, alternating categories. With
-// `substyles`, every fifth style owns a character substyle and every
-// twentieth a list of two to four of them.
+const Text kFonts[] = {u"Garamond Premier Pro", u"Avenir Next", u"Minion Pro", u"Source Serif"};
+const Text kAlignments[] = {u"left", u"justify", u"centre"};
+
+// Sets `count` of the properties on `style`, with values drawn from `random`.
+void SetValues(Style& style, std::size_t count, std::mt19937& random) {
+  for (std::size_t k = 0; k < count; ++k) {
+    const PropertySpec& property = kProperties[k];
+    if (!property.number)
+      style.SetProperty(property.name,
+                        Any(k == 0   ? kFonts[random() % 4]
+                            : k == 2 ? Text::FormatInternal("#%06x", random() % 0xFFFFFF)
+                                     : kAlignments[random() % 3]));
+    else
+      style.SetProperty(property.name, Any(static_cast<double>(random() % 400) / 4));
+  }
+}
+
 std::unique_ptr<StyleSheet> MakeSheet(std::int64_t count, bool substyles) {
   RegisterCategories();
+  std::mt19937 random(20261123);
   auto sheet = std::make_unique<StyleSheet>();
-  Style* previous = nullptr;
+  std::vector<Style*> made;
   for (std::int64_t i = 0; i < count; ++i) {
-    Style* style = new Style(i % 10 == 0 ? nullptr : previous, i % 2 ? kCharacter : kParagraph);
-    style->SetProperty(kSize, 8.0 + static_cast<double>(i % 17) * 0.5);
-    style->SetProperty(kSpacing, static_cast<double>(i % 5));
-    style->SetProperty(kFont, Text(u"Garamond Premier Pro"));
-    if (i % 3 == 0)
-      style->SetProperty(kColour, Text(u"#1f3a5c"));
-    if (substyles && i % 5 == 0) {
-      style->SetPathProperty({kCharacter, kSize}, ZelUtils::Any(9.5));
-      style->SetPathProperty({kCharacter, kFont}, ZelUtils::Any(Text(u"Minion Pro")));
+    const bool paragraph = i % 4 != 3;
+    Style* parent = nullptr;
+    if (random() % 10 < 7 && !made.empty()) {
+      // A recent style of the same category, so that chains grow a few deep.
+      const std::size_t back = 1 + random() % std::min<std::size_t>(made.size(), 8);
+      Style* candidate = made[made.size() - back];
+      if (candidate->GetCategoryName() == (paragraph ? kParagraph : kCharacter))
+        parent = candidate;
     }
-    if (substyles && i % 20 == 1) {
+    Style* style = new Style(parent, paragraph ? kParagraph : kCharacter);
+    SetValues(*style, 4 + random() % 9, random);
+    if (substyles && paragraph && i % 5 == 0) {
       Style run(nullptr, kCharacter);
-      run.SetProperty(kColour, Text(u"#8b0000"));
-      run.SetProperty(kSize, 7.0);
-      // The style stores copies of the list's substyles.
-      style->SetProperty(kRuns, std::vector<Style*>(2 + static_cast<std::size_t>(i % 3), &run));
+      SetValues(run, 2 + random() % 3, random);
+      style->SetProperty(kCharacter, Any(static_cast<const Style*>(&run)));
     }
-    sheet->AddStyle(Text::FormatInternal("Style number %lld", static_cast<long long>(i)), style,
-                    false);
-    previous = style;
+    if (substyles && paragraph && i % 20 == 1) {
+      Style cell(nullptr, kCharacter);
+      SetValues(cell, 3, random);
+      // The style stores copies of the list's substyles.
+      style->SetProperty(kCells, std::vector<Style*>(2 + random() % 3, &cell));
+    }
+    const Text name = (i % 3 == 0 ? Text(u"\u00dcberschrift ") : Text(u"Body Text ")) +
+                      Text::FormatInternal("%lld", static_cast<long long>(i));
+    sheet->AddStyle(name, style, false);
+    made.push_back(style);
   }
   return sheet;
 }
 
-Text MakeText(std::int64_t count, bool substyles) {
-  Text text;
-  MakeSheet(count, substyles)->ExportToString(text, false);
+// Documents are made once per size and variant and kept for the whole run.
+const Text& Document(std::int64_t count, bool substyles) {
+  static std::map<std::pair<std::int64_t, bool>, Text> documents;
+  Text& text = documents[{count, substyles}];
+  if (text.IsEmpty())
+    MakeSheet(count, substyles)->ExportToString(text, false);
   return text;
 }
 
@@ -109,41 +179,41 @@ void Report(benchmark::State& state, const Text& text) {
   state.SetItemsProcessed(state.iterations() * state.range(0));
 }
 
-void BM_ExportSheet(benchmark::State& state) {
-  const std::unique_ptr<StyleSheet> sheet = MakeSheet(state.range(0), state.range(1) != 0);
-  Text text;
-  for (auto _ : state) {
-    sheet->ExportToString(text, false);
-    benchmark::DoNotOptimize(text.data());
-  }
-  Report(state, text);
-}
-
-// Includes destroying the imported styles, which every real import pays for.
-void BM_ImportSheet(benchmark::State& state) {
-  const Text text = MakeText(state.range(0), state.range(1) != 0);
+// Includes destroying the sheet, which every real import pays for.
+void BM_Import(benchmark::State& state) {
+  const Text& text = Document(state.range(0), state.range(1) != 0);
   for (auto _ : state) {
     StyleSheet sheet;
-    const bool imported = sheet.ImportFromString(text, true);
-    benchmark::DoNotOptimize(imported);
+    benchmark::DoNotOptimize(sheet.ImportFromString(text, true));
   }
   Report(state, text);
 }
 
-void BM_RawRapidJsonParse(benchmark::State& state) {
-  const Text text = MakeText(state.range(0), state.range(1) != 0);
+void BM_RapidJsonParse(benchmark::State& state) {
+  const Text& text = Document(state.range(0), state.range(1) != 0);
   for (auto _ : state) {
-    rapidjson::GenericReader<Utf16, Utf16> reader;
-    rapidjson::GenericStringStream<Utf16> stream(text.c_str());
-    rapidjson::BaseReaderHandler<Utf16> handler;
-    const rapidjson::ParseResult result = reader.Parse(stream, handler);
-    benchmark::DoNotOptimize(result);
+    rapidjson::GenericDocument<Utf16> document;
+    document.Parse<rapidjson::kParseValidateEncodingFlag | rapidjson::kParseFullPrecisionFlag>(
+        text.c_str());
+    benchmark::DoNotOptimize(document.HasParseError());
   }
   Report(state, text);
 }
 
-void BM_RawRapidJsonWrite(benchmark::State& state) {
-  const Text text = MakeText(state.range(0), state.range(1) != 0);
+void BM_Export(benchmark::State& state) {
+  StyleSheet sheet;
+  const Text& text = Document(state.range(0), state.range(1) != 0);
+  sheet.ImportFromString(text, true);
+  Text written;
+  for (auto _ : state) {
+    sheet.ExportToString(written, false);
+    benchmark::DoNotOptimize(written.data());
+  }
+  Report(state, text);
+}
+
+void BM_RapidJsonWrite(benchmark::State& state) {
+  const Text& text = Document(state.range(0), state.range(1) != 0);
   rapidjson::GenericDocument<Utf16> document;
   document.Parse(text.c_str());
   for (auto _ : state) {
@@ -155,16 +225,238 @@ void BM_RawRapidJsonWrite(benchmark::State& state) {
   Report(state, text);
 }
 
-// Sizes 100 to 10,000 styles, each without and with substyles.
-void SheetSizes(benchmark::internal::Benchmark* family) {
-  family->ArgsProduct({benchmark::CreateRange(100, 10000, 10), {0, 1}})
+// Deletes the same 100 styles (every hundredth of the first 10,000) from a
+// freshly imported sheet; only the deletion is timed.
+void BM_DeleteStyles(benchmark::State& state) {
+  const Text& text = Document(state.range(0), false);
+  for (auto _ : state) {
+    state.PauseTiming();
+    auto sheet = std::make_unique<StyleSheet>();
+    sheet->ImportFromString(text, true);
+    const std::vector<Style*> styles = sheet->GetStyles();
+    std::vector<Style*> doomed;
+    for (std::size_t i = 0; i < 10000 && i < styles.size(); i += 100)
+      doomed.push_back(styles[i]);
+    state.ResumeTiming();
+    sheet->DeleteStyles(Styles::StyleSpan(doomed, false));
+    state.PauseTiming();
+    sheet.reset();
+    state.ResumeTiming();
+  }
+  state.SetItemsProcessed(state.iterations() * 100);
+}
+
+// Chains five deep where only the root sets the looked-up key; each style
+// also sets eight other keys. Leaves are visited in shuffled order.
+constexpr int kChains = 20000;
+constexpr int kDepth = 4;
+
+struct PlainStyle {
+  const PlainStyle* parent = nullptr;
+  std::vector<std::pair<const void*, double>> values; // sorted by key
+};
+
+struct LookupData {
+  LookupData() {
+    RegisterCategories();
+    std::mt19937 random(4);
+    for (int c = 0; c < kChains; ++c) {
+      Style* parent = nullptr;
+      const PlainStyle* plainParent = nullptr;
+      for (int level = 0; level <= kDepth; ++level) {
+        styles.emplace_back(new Style(parent, kParagraph));
+        plain.emplace_back(new PlainStyle);
+        Style& style = *styles.back();
+        PlainStyle& mirror = *plain.back();
+        mirror.parent = plainParent;
+        for (int k = 1; k < 12; ++k) {
+          if (!kProperties[k].number || (level > 0 && k == 1))
+            continue;
+          const double value = static_cast<double>(random() % 100);
+          style.SetProperty(kProperties[k].name, Any(value));
+          mirror.values.emplace_back(&PropertyKey(kProperties[k].name).GetString(), value);
+        }
+        std::sort(mirror.values.begin(), mirror.values.end());
+        parent = &style;
+        plainParent = &mirror;
+      }
+      leaves.push_back(parent);
+      plainLeaves.push_back(plainParent);
+    }
+    std::vector<std::size_t> order(leaves.size());
+    for (std::size_t i = 0; i < order.size(); ++i)
+      order[i] = i;
+    std::shuffle(order.begin(), order.end(), random);
+    std::vector<const Style*> shuffled;
+    std::vector<const PlainStyle*> plainShuffled;
+    for (const std::size_t i : order) {
+      shuffled.push_back(leaves[i]);
+      plainShuffled.push_back(plainLeaves[i]);
+    }
+    leaves.swap(shuffled);
+    plainLeaves.swap(plainShuffled);
+  }
+  std::vector<std::unique_ptr<Style>> styles;
+  std::vector<std::unique_ptr<PlainStyle>> plain;
+  std::vector<const Style*> leaves;
+  std::vector<const PlainStyle*> plainLeaves;
+};
+
+const LookupData& Lookups() {
+  static const LookupData data;
+  return data;
+}
+
+void BM_LookupFourthParent(benchmark::State& state) {
+  const LookupData& data = Lookups();
+  const PropertyKey key(kProperties[1].name);
+  std::size_t i = 0;
+  for (auto _ : state) {
+    benchmark::DoNotOptimize(&data.leaves[i]->GetProperty(key));
+    i = i + 1 == data.leaves.size() ? 0 : i + 1;
+  }
+  state.SetItemsProcessed(state.iterations());
+}
+
+void BM_PlainWalkFourthParent(benchmark::State& state) {
+  const LookupData& data = Lookups();
+  const void* key = &PropertyKey(kProperties[1].name).GetString();
+  std::size_t i = 0;
+  for (auto _ : state) {
+    const double* found = nullptr;
+    for (const PlainStyle* style = data.plainLeaves[i]; style && !found; style = style->parent) {
+      const auto entry = std::lower_bound(style->values.begin(), style->values.end(), key,
+                                          [](const std::pair<const void*, double>& value,
+                                             const void* k) { return value.first < k; });
+      if (entry != style->values.end() && entry->first == key)
+        found = &entry->second;
+    }
+    benchmark::DoNotOptimize(found);
+    i = i + 1 == data.plainLeaves.size() ? 0 : i + 1;
+  }
+  state.SetItemsProcessed(state.iterations());
+}
+
+// Bytes in use at the peak of one import, and kept by the sheet afterwards,
+// each as a multiple of the document's UTF-16 size.
+void BM_ImportMemory(benchmark::State& state) {
+  const Text& text = Document(state.range(0), state.range(1) != 0);
+  double peak = 0, kept = 0;
+  for (auto _ : state) {
+    const std::size_t before = g_bytesInUse;
+    g_peakBytes = before;
+    auto sheet = std::make_unique<StyleSheet>();
+    sheet->ImportFromString(text, true);
+    kept = static_cast<double>(g_bytesInUse - before);
+    peak = static_cast<double>(g_peakBytes - before);
+    sheet.reset();
+  }
+  const double bytes = static_cast<double>(text.GetLength() * 2);
+  state.counters["peak_x_text"] = peak / bytes;
+  state.counters["kept_x_text"] = kept / bytes;
+}
+
+void Sizes(benchmark::internal::Benchmark* family) {
+  family->ArgsProduct({{1000, 10000, 100000}, {0, 1}})
       ->ArgNames({"styles", "substyles"})
       ->Unit(benchmark::kMillisecond);
 }
 
+// Keeps every run so that the summary can set them side by side.
+class SummaryReporter : public benchmark::ConsoleReporter {
+public:
+  void ReportRuns(const std::vector<Run>& runs) override {
+    ConsoleReporter::ReportRuns(runs);
+    for (const Run& run : runs)
+      if (run.run_type == Run::RT_Iteration && !run.error_occurred)
+        m_runs[run.benchmark_name()] = run;
+  }
+
+  void PrintSummary() const {
+    std::printf("\nSummary (ratios from this one run; the machine is a shared 2-core one)\n");
+    for (const char* variant : {"0", "1"}) {
+      const std::string tail = std::string("/substyles:") + variant;
+      std::printf("%s documents:\n", variant[0] == '1' ? "With substyles" : "Plain");
+      for (const char* size : {"1000", "10000", "100000"}) {
+        const std::string args = std::string("/styles:") + size + tail;
+        std::printf("  %6s styles: import %.2fx RapidJSON's parse speed, export %.2fx its "
+                    "Writer's (goal: 0.5x or more)\n",
+                    size, Ratio("BM_RapidJsonParse" + args, "BM_Import" + args),
+                    Ratio("BM_RapidJsonWrite" + args, "BM_Export" + args));
+      }
+      const std::string small = "/styles:10000" + tail, large = "/styles:100000" + tail;
+      std::printf("  10x the document: import %.1fx, export %.1fx the time; RapidJSON's parse "
+                  "%.1fx, write %.1fx (goal: 10.5x or less)\n",
+                  Ratio("BM_Import" + large, "BM_Import" + small),
+                  Ratio("BM_Export" + large, "BM_Export" + small),
+                  Ratio("BM_RapidJsonParse" + large, "BM_RapidJsonParse" + small),
+                  Ratio("BM_RapidJsonWrite" + large, "BM_RapidJsonWrite" + small));
+      const Run* memory = Find("BM_ImportMemory" + large);
+      if (memory)
+        std::printf("  100k import: peak %.2fx, kept %.2fx the UTF-16 text (goal: 2.5x, 1.5x)\n",
+                    double(memory->counters.at("peak_x_text")),
+                    double(memory->counters.at("kept_x_text")));
+    }
+    std::printf("  DeleteStyles of 100 styles, 10x the sheet: %.1fx the time (goal: 10.5x or "
+                "less)\n",
+                Ratio("BM_DeleteStyles/styles:100000", "BM_DeleteStyles/styles:10000"));
+    std::printf("  Lookup answered by the 4th parent: %.2fx the plain walk (goal: 1.2x or "
+                "less)\n",
+                Ratio("BM_LookupFourthParent", "BM_PlainWalkFourthParent"));
+    for (const char* size : {"10000", "100000"}) {
+      const std::string args = std::string("/styles:") + size;
+      std::printf("  %6s styles, time per byte with substyles against plain: import %.2fx, "
+                  "export %.2fx (goal: 1x or less)\n",
+                  size, PerByte("BM_Import" + args), PerByte("BM_Export" + args));
+    }
+  }
+
+private:
+  const Run* Find(const std::string& name) const {
+    const auto found = m_runs.find(name);
+    return found == m_runs.end() ? nullptr : &found->second;
+  }
+  // Time of `numerator` over time of `denominator`; 0 when one is missing.
+  double Ratio(const std::string& numerator, const std::string& denominator) const {
+    const Run* a = Find(numerator);
+    const Run* b = Find(denominator);
+    return a && b ? a->GetAdjustedRealTime() / b->GetAdjustedRealTime() : 0.0;
+  }
+  double PerByte(const std::string& stem) const {
+    const Run* with = Find(stem + "/substyles:1");
+    const Run* without = Find(stem + "/substyles:0");
+    if (!with || !without)
+      return 0.0;
+    // Bytes per second already divides by the time; its inverse is time per byte.
+    return without->counters.at("bytes_per_second").value /
+           with->counters.at("bytes_per_second").value;
+  }
+
+  std::map<std::string, Run> m_runs;
+};
+
 } // namespace
 
-BENCHMARK(BM_ExportSheet)->Apply(SheetSizes);
-BENCHMARK(BM_ImportSheet)->Apply(SheetSizes);
-BENCHMARK(BM_RawRapidJsonParse)->Apply(SheetSizes);
-BENCHMARK(BM_RawRapidJsonWrite)->Apply(SheetSizes);
+BENCHMARK(BM_RapidJsonParse)->Apply(Sizes);
+BENCHMARK(BM_Import)->Apply(Sizes);
+BENCHMARK(BM_RapidJsonWrite)->Apply(Sizes);
+BENCHMARK(BM_Export)->Apply(Sizes);
+BENCHMARK(BM_ImportMemory)->Apply(Sizes)->Iterations(1);
+BENCHMARK(BM_DeleteStyles)
+    ->ArgName("styles")
+    ->Arg(10000)
+    ->Arg(100000)
+    ->Unit(benchmark::kMillisecond);
+BENCHMARK(BM_LookupFourthParent);
+BENCHMARK(BM_PlainWalkFourthParent);
+
+int main(int argc, char** argv) {
+  benchmark::Initialize(&argc, argv);
+  if (benchmark::ReportUnrecognizedArguments(argc, argv))
+    return 1;
+  SummaryReporter reporter;
+  benchmark::RunSpecifiedBenchmarks(&reporter);
+  reporter.PrintSummary();
+  benchmark::Shutdown();
+  return 0;
+}

@@ -6,6 +6,7 @@
 #include <Styles/StyleProperty.h>
 #include <Styles/StyleUtilities.h>
 
+#include <Json/Json.h>
 #include <ZelPref/ConversionPolicy.h>
 #include <ZelUtils/Stream.h>
 
@@ -689,6 +690,9 @@ TEST_F(StyleSheetTest, RoundTripKeepsTextAndEffectiveValues) {
     original.AddStyle(Text(u"\u00dcberschrift ") + Text::FormatInternal("%d", i), previous, false);
   }
   const Text text = Export(original);
+  JsonValue tree{Json::Object()}; // the document's tree gives the same text
+  original.ExportJson(tree, false);
+  EXPECT_EQ(Json::ValueToString(tree, false), text);
   ASSERT_TRUE(copy.ImportFromString(text, true));
   EXPECT_EQ(Export(copy), text);
   for (const Style* style : original.GetStyles()) {

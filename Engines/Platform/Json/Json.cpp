@@ -27,6 +27,7 @@ thread_local unsigned g_failedChecks = 0;
 #include <string>
 #include <string_view>
 #include <system_error>
+#include <type_traits>
 
 namespace Json {
 namespace {
@@ -204,13 +205,10 @@ template <class Writer> class TreeWriter {
 public:
   explicit TreeWriter(Writer& writer) : m_writer(writer) {}
 
+  // Writes `root` whole; true when every piece was written.
   bool Write(const Value& root) {
-    struct Frame {
-      const Object* object;
-      const Array* array;
-      std::size_t next;
-    };
-    std::vector<Frame> open;
+    std::vector<Frame>& open = m_open;
+    open.clear();
     const Value* pending = &root;
     for (;;) {
       if (pending) {
@@ -228,7 +226,7 @@ public:
         pending = nullptr;
       }
       if (open.empty())
-        return m_writer.IsComplete();
+        return true;
       Frame& top = open.back();
       if (top.object) {
         if (top.next == top.object->GetSize()) {
@@ -253,7 +251,25 @@ public:
     }
   }
 
+  bool WriteText(std::u16string_view text, bool isKey) {
+    if (text.size() > std::numeric_limits<SizeType>::max())
+      return false;
+    const char16_t* data = text.data();
+    if (HasUnpairedSurrogate(text)) {
+      ReplaceUnpairedSurrogates(text, m_scratch);
+      data = m_scratch.data();
+    }
+    const auto length = static_cast<SizeType>(text.size());
+    return isKey ? m_writer.Key(data, length) : m_writer.String(data, length);
+  }
+
 private:
+  struct Frame {
+    const Object* object;
+    const Array* array;
+    std::size_t next;
+  };
+
   bool WriteScalar(const Value& value) {
     if (const auto* text = value.GetIf<ZelStringT<char16_t>>())
       return WriteText(text->GetView(), false);
@@ -265,18 +281,6 @@ private:
       return WriteText(ZelPlatform::Utf8ToUtf16(utf8->GetView()), false);
     }
     return m_writer.Null();
-  }
-
-  bool WriteText(std::u16string_view text, bool isKey) {
-    if (text.size() > std::numeric_limits<SizeType>::max())
-      return false;
-    const char16_t* data = text.data();
-    if (HasUnpairedSurrogate(text)) {
-      ReplaceUnpairedSurrogates(text, m_scratch);
-      data = m_scratch.data();
-    }
-    const auto length = static_cast<SizeType>(text.size());
-    return isKey ? m_writer.Key(data, length) : m_writer.String(data, length);
   }
 
   // The shortest text that reads back as the same double; integers without
@@ -298,34 +302,38 @@ private:
   }
 
   Writer& m_writer;
+  std::vector<Frame> m_open;
   std::u16string m_scratch;
 };
 
 } // namespace
 
-bool Parse(const ZelStringT<char16_t>& text, Value& out, ZelStringT<char16_t>& errorText) {
-  const std::size_t skipped = !text.IsEmpty() && text[0] == kByteOrderMark ? 1 : 0;
-  // The reader works on a copy that it may overwrite: it decodes strings in
-  // place and hands numbers over as their text, untouched.
-  std::u16string buffer(text.GetView().substr(skipped));
+namespace {
+
+// Runs the reader over `buffer` (the text without a leading byte order mark,
+// `skipped` units shorter) with `handler`; false, with `errorText` set, when
+// the text is not exactly one valid JSON value.
+template <class Handler>
+bool RunReader(std::u16string& buffer, std::size_t skipped, Handler& handler,
+               ZelStringT<char16_t>& errorText) {
+  // The reader decodes strings in place and hands numbers over as their
+  // text, untouched: the handler converts them, since the reader's own
+  // conversion misrounds some (10e308 gives a tiny negative number, 2e-324 is
+  // not rounded to zero) and can overflow its exponent arithmetic.
   rapidjson::GenericInsituStringStream<Utf16> stream(buffer.data());
-  TreeBuilder builder;
   rapidjson::GenericReader<Utf16, Utf16> reader;
-  // Numbers are converted by the builder: the reader's own conversion
-  // misrounds some (10e308 gives a tiny negative number, 2e-324 is not
-  // rounded to zero) and can overflow its exponent arithmetic.
   constexpr unsigned kFlags = rapidjson::kParseIterativeFlag | rapidjson::kParseInsituFlag |
                               rapidjson::kParseValidateEncodingFlag |
                               rapidjson::kParseNumbersAsStringsFlag;
   const unsigned failedChecks = g_failedChecks;
-  const rapidjson::ParseResult result = reader.Parse<kFlags>(stream, builder);
+  const rapidjson::ParseResult result = reader.Parse<kFlags>(stream, handler);
 
   const char* message = nullptr;
   std::size_t offset = 0;
   if (result.IsError()) {
-    const bool stoppedByBuilder =
-        result.Code() == rapidjson::kParseErrorTermination && builder.GetError();
-    message = stoppedByBuilder ? builder.GetError() : rapidjson::GetParseError_En(result.Code());
+    const bool stoppedByHandler =
+        result.Code() == rapidjson::kParseErrorTermination && handler.GetError();
+    message = stoppedByHandler ? handler.GetError() : rapidjson::GetParseError_En(result.Code());
     offset = result.Offset() + skipped;
   } else if (g_failedChecks != failedChecks) {
     message = "Invalid text";
@@ -342,27 +350,249 @@ bool Parse(const ZelStringT<char16_t>& text, Value& out, ZelStringT<char16_t>& e
     errorText = Widen(description) + u" at offset " + Widen(std::to_string(offset));
     return false;
   }
-  out = std::move(builder.GetRoot());
   errorText = ZelStringT<char16_t>();
   return true;
 }
 
-ZelStringT<char16_t> ValueToString(const Value& value, bool format) {
-  using Buffer = rapidjson::GenericStringBuffer<Utf16>;
-  Buffer buffer;
-  const unsigned failedChecks = g_failedChecks;
-  bool written = false;
-  if (format) {
-    rapidjson::PrettyWriter<Buffer, Utf16, Utf16> writer(buffer);
-    writer.SetIndent(' ', 2);
-    written = TreeWriter<decltype(writer)>(writer).Write(value);
-  } else {
-    rapidjson::Writer<Buffer, Utf16, Utf16> writer(buffer);
-    written = TreeWriter<decltype(writer)>(writer).Write(value);
+std::size_t ByteOrderMarkLength(const ZelStringT<char16_t>& text) {
+  return !text.IsEmpty() && text[0] == kByteOrderMark ? 1 : 0;
+}
+
+// SAX handler that builds a Document's nodes. The children of open
+// containers wait on a stack; when a container closes they move, in order,
+// to the end of the final array and the container records where they start.
+class DocumentBuilder {
+public:
+  using Ch = char16_t;
+  using Node = detail::DocumentNode;
+
+  explicit DocumentBuilder(std::vector<Node>& nodes) : m_nodes(nodes) {}
+
+  bool Null() { return Push(Node{Node::kNull, 0, {}}); }
+  bool Bool(bool flag) {
+    Node node{Node::kBool, 0, {}};
+    node.flag = flag;
+    return Push(node);
   }
-  if (!written || g_failedChecks != failedChecks)
+  bool Int(int number) { return Number(number); }
+  bool Uint(unsigned number) { return Number(number); }
+  bool Int64(std::int64_t number) { return Number(static_cast<double>(number)); }
+  bool Uint64(std::uint64_t number) { return Number(static_cast<double>(number)); }
+  bool Double(double number) { return Number(number); }
+  bool RawNumber(const Ch* text, SizeType length, bool) {
+    double number = 0;
+    if (!ReadNumber(text, length, number))
+      return Fail("Number too big to be stored in double");
+    return Number(number);
+  }
+  bool String(const Ch* text, SizeType length, bool) {
+    if (HasUnpairedSurrogate(std::u16string_view(text, length)))
+      return Fail("Unpaired surrogate in string");
+    return Push(Text(Node::kString, text, length));
+  }
+  bool Key(const Ch* text, SizeType length, bool) {
+    if (HasUnpairedSurrogate(std::u16string_view(text, length)))
+      return Fail("Unpaired surrogate in member name");
+    return Push(Text(Node::kName, text, length));
+  }
+  bool StartObject() { return Enter(); }
+  bool StartArray() { return Enter(); }
+  bool EndObject(SizeType memberCount) { return Leave(Node::kObject, memberCount, 2); }
+  bool EndArray(SizeType elementCount) { return Leave(Node::kArray, elementCount, 1); }
+
+  // Moves the root to the end of the final array; once the reader succeeded.
+  void Finish() { m_nodes.push_back(m_open.back()); }
+  const char* GetError() const { return m_error; }
+
+private:
+  static Node Text(Node::Kind kind, const Ch* text, SizeType length) {
+    Node node{kind, length, {}};
+    node.text = text;
+    return node;
+  }
+  bool Number(double number) {
+    Node node{Node::kNumber, 0, {}};
+    node.number = number;
+    return Push(node);
+  }
+  bool Push(const Node& node) {
+    m_open.push_back(node);
+    return true;
+  }
+  bool Enter() {
+    // As Json::Parse counts it: the root's slot is the first level.
+    if (++m_depth > kMaxDepth + 1)
+      return Fail("Nesting too deep");
+    return true;
+  }
+  bool Leave(Node::Kind kind, SizeType count, std::size_t nodesPerChild) {
+    --m_depth;
+    const std::size_t children = count * nodesPerChild;
+    Node node{kind, count, {}};
+    node.first = static_cast<std::uint32_t>(m_nodes.size());
+    if (m_nodes.size() + children > std::numeric_limits<std::uint32_t>::max())
+      return Fail("Document too large");
+    m_nodes.insert(m_nodes.end(), m_open.end() - static_cast<std::ptrdiff_t>(children),
+                   m_open.end());
+    m_open.resize(m_open.size() - children);
+    m_open.push_back(node);
+    return true;
+  }
+  bool Fail(const char* message) {
+    m_error = message;
+    return false;
+  }
+
+  std::vector<Node>& m_nodes;
+  std::vector<Node> m_open;
+  int m_depth = 1;
+  const char* m_error = nullptr;
+};
+
+} // namespace
+
+bool Parse(const ZelStringT<char16_t>& text, Value& out, ZelStringT<char16_t>& errorText) {
+  const std::size_t skipped = ByteOrderMarkLength(text);
+  std::u16string buffer(text.GetView().substr(skipped));
+  TreeBuilder builder;
+  if (!RunReader(buffer, skipped, builder, errorText))
+    return false;
+  out = std::move(builder.GetRoot());
+  return true;
+}
+
+Document::Document() : m_nodes(1, detail::DocumentNode{detail::DocumentNode::kNull, 0, {}}) {}
+
+Document::~Document() = default;
+
+bool Document::Parse(const ZelStringT<char16_t>& text, ZelStringT<char16_t>& errorText) {
+  const std::size_t skipped = ByteOrderMarkLength(text);
+  m_buffer.assign(text.GetView().substr(skipped));
+  m_nodes.clear();
+  DocumentBuilder builder(m_nodes);
+  if (!RunReader(m_buffer, skipped, builder, errorText)) {
+    m_buffer.clear();
+    m_nodes.assign(1, detail::DocumentNode{detail::DocumentNode::kNull, 0, {}});
+    return false;
+  }
+  builder.Finish();
+  return true;
+}
+
+Value Document::Ref::ToValue() const {
+  switch (m_node->kind) {
+  case Node::kString:
+    return Value(ZelStringT<char16_t>(m_node->text, m_node->size));
+  case Node::kNumber:
+    return Value(m_node->number);
+  case Node::kBool:
+    return Value(m_node->flag);
+  case Node::kObject: {
+    // Nesting is bounded by kMaxDepth, and so is this recursion.
+    std::vector<Member> members;
+    members.reserve(m_node->size);
+    for (std::size_t i = 0; i < m_node->size; ++i)
+      members.push_back(Member{ZelStringT<char16_t>(GetMemberName(i)), GetMember(i).ToValue()});
+    return Value(Object(std::move(members)));
+  }
+  case Node::kArray: {
+    std::vector<Value> elements;
+    elements.reserve(m_node->size);
+    for (std::size_t i = 0; i < m_node->size; ++i)
+      elements.push_back(GetElement(i).ToValue());
+    return Value(Array(std::move(elements)));
+  }
+  default:
+    return Value();
+  }
+}
+
+void Document::Ref::AssignTo(Value& out) const {
+  if (IsString()) {
+    if (ZelStringT<char16_t>* text = out.GetIf<ZelStringT<char16_t>>()) {
+      text->GetStdString().assign(m_node->text, m_node->size);
+      return;
+    }
+  }
+  out = ToValue();
+}
+
+// What Writer forwards to: a RapidJSON writer of either layout.
+struct Writer::Impl {
+  using Buffer = rapidjson::GenericStringBuffer<Utf16>;
+  virtual ~Impl() = default;
+  virtual bool StartObject() = 0;
+  virtual bool EndObject() = 0;
+  virtual bool StartArray() = 0;
+  virtual bool EndArray() = 0;
+  virtual bool Text(std::u16string_view text, bool isKey) = 0;
+  virtual bool Write(const Value& value) = 0;
+  virtual bool IsComplete() const = 0;
+
+  Buffer buffer;
+  unsigned failedChecks = g_failedChecks;
+  bool failed = false;
+};
+
+namespace {
+
+template <class RapidWriter> struct WriterOf final : Writer::Impl {
+  WriterOf() : writer(buffer), tree(writer) {
+    if constexpr (!std::is_same<RapidWriter, rapidjson::Writer<Buffer, Utf16, Utf16>>::value)
+      writer.SetIndent(' ', 2);
+  }
+  bool StartObject() override { return writer.StartObject(); }
+  bool EndObject() override { return writer.EndObject(); }
+  bool StartArray() override { return writer.StartArray(); }
+  bool EndArray() override { return writer.EndArray(); }
+  bool Text(std::u16string_view text, bool isKey) override { return tree.WriteText(text, isKey); }
+  bool Write(const Value& value) override { return tree.Write(value); }
+  bool IsComplete() const override { return writer.IsComplete(); }
+
+  RapidWriter writer;
+  TreeWriter<RapidWriter> tree;
+};
+
+using CompactWriter = WriterOf<rapidjson::Writer<Writer::Impl::Buffer, Utf16, Utf16>>;
+using IndentedWriter = WriterOf<rapidjson::PrettyWriter<Writer::Impl::Buffer, Utf16, Utf16>>;
+
+} // namespace
+
+Writer::Writer(bool format)
+    : m_impl(format ? std::unique_ptr<Impl>(new IndentedWriter)
+                    : std::unique_ptr<Impl>(new CompactWriter)) {}
+
+Writer::~Writer() = default;
+
+bool Writer::Check(bool written) {
+  if (!written)
+    m_impl->failed = true;
+  return !m_impl->failed;
+}
+
+bool Writer::StartObject() { return Check(!m_impl->failed && m_impl->StartObject()); }
+bool Writer::EndObject() { return Check(!m_impl->failed && m_impl->EndObject()); }
+bool Writer::StartArray() { return Check(!m_impl->failed && m_impl->StartArray()); }
+bool Writer::EndArray() { return Check(!m_impl->failed && m_impl->EndArray()); }
+bool Writer::Key(std::u16string_view name) {
+  return Check(!m_impl->failed && m_impl->Text(name, true));
+}
+bool Writer::String(std::u16string_view text) {
+  return Check(!m_impl->failed && m_impl->Text(text, false));
+}
+bool Writer::Write(const Value& value) { return Check(!m_impl->failed && m_impl->Write(value)); }
+
+ZelStringT<char16_t> Writer::TakeText() {
+  Impl& impl = *m_impl;
+  if (impl.failed || !impl.IsComplete() || g_failedChecks != impl.failedChecks)
     return ZelStringT<char16_t>();
-  return ZelStringT<char16_t>(buffer.GetString(), buffer.GetSize() / sizeof(char16_t));
+  return ZelStringT<char16_t>(impl.buffer.GetString(), impl.buffer.GetSize() / sizeof(char16_t));
+}
+
+ZelStringT<char16_t> ValueToString(const Value& value, bool format) {
+  Writer writer(format);
+  writer.Write(value);
+  return writer.TakeText();
 }
 
 } // namespace Json

@@ -11,6 +11,9 @@
 
 #include <cassert>
 #include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <string>
 #include <string_view>
 #include <type_traits>
 #include <utility>
@@ -172,6 +175,119 @@ ZEL_API bool Parse(const ZelStringT<char16_t>& text, Value& out, ZelStringT<char
 // U+FFFD and invalid UTF-8 in ZelStringT<char> values does too. Returns an
 // empty string if the text cannot be produced.
 ZEL_API ZelStringT<char16_t> ValueToString(const Value& value, bool format);
+
+namespace detail {
+// One value of a Document, or the name of an object member.
+struct DocumentNode {
+  enum Kind : std::uint8_t { kNull, kString, kNumber, kBool, kObject, kArray, kName };
+  Kind kind;
+  std::uint32_t size; // a string's or name's length; an object's members, an array's elements
+  union {
+    double number;
+    bool flag;
+    const char16_t* text;
+    std::uint32_t first; // a container's first child: members come as name, value pairs
+  };
+};
+} // namespace detail
+
+// A JSON text parsed once into a compact, read-only form: the values sit in
+// one array and the strings point into the document's own copy of the text,
+// so reading even a large text takes a handful of allocations instead of
+// several per value. Parse accepts and rejects exactly what Json::Parse
+// does, with the same messages; ToValue turns any part into an ordinary Value.
+class ZEL_API Document {
+public:
+  // A value inside a document; valid while the document lives unchanged.
+  class Ref {
+  public:
+    bool IsNull() const noexcept { return m_node->kind == Node::kNull; }
+    bool IsString() const noexcept { return m_node->kind == Node::kString; }
+    bool IsNumber() const noexcept { return m_node->kind == Node::kNumber; }
+    bool IsBool() const noexcept { return m_node->kind == Node::kBool; }
+    bool IsObject() const noexcept { return m_node->kind == Node::kObject; }
+    bool IsArray() const noexcept { return m_node->kind == Node::kArray; }
+    // The text of a string; empty for other kinds.
+    std::u16string_view GetString() const noexcept {
+      return IsString() ? std::u16string_view(m_node->text, m_node->size) : std::u16string_view();
+    }
+    double GetNumber() const noexcept { return IsNumber() ? m_node->number : 0.0; }
+    bool GetBool() const noexcept { return IsBool() && m_node->flag; }
+    // The number of members of an object or elements of an array; else 0.
+    std::size_t GetSize() const noexcept { return IsObject() || IsArray() ? m_node->size : 0; }
+    // Member i of an object (i below GetSize()).
+    std::u16string_view GetMemberName(std::size_t i) const noexcept {
+      const Node& name = m_nodes[m_node->first + 2 * i];
+      return std::u16string_view(name.text, name.size);
+    }
+    Ref GetMember(std::size_t i) const noexcept {
+      return Ref(m_nodes, &m_nodes[m_node->first + 2 * i + 1]);
+    }
+    // Element i of an array (i below GetSize()).
+    Ref GetElement(std::size_t i) const noexcept {
+      return Ref(m_nodes, &m_nodes[m_node->first + i]);
+    }
+    // An owning copy of this value and everything in it.
+    ZEL_API Value ToValue() const;
+    // Makes `out` this value, reusing the storage of a string it holds.
+    ZEL_API void AssignTo(Value& out) const;
+
+  private:
+    friend class Document;
+    using Node = detail::DocumentNode;
+    Ref(const Node* nodes, const Node* node) noexcept : m_nodes(nodes), m_node(node) {}
+
+    const Node* m_nodes;
+    const Node* m_node;
+  };
+
+  Document();
+  ~Document();
+  Document(const Document&) = delete;
+  Document& operator=(const Document&) = delete;
+
+  // Parses the whole of `text`; on failure the document is empty (its root
+  // is null) and `errorText` says why, as Json::Parse would.
+  bool Parse(const ZelStringT<char16_t>& text, ZelStringT<char16_t>& errorText);
+  // The parsed value; null before a successful Parse.
+  Ref GetRoot() const noexcept { return Ref(m_nodes.data(), &m_nodes.back()); }
+
+private:
+  std::u16string m_buffer;                   // the text, strings decoded in place
+  std::vector<detail::DocumentNode> m_nodes; // children before parents; the root last
+};
+
+// Writes JSON text piece by piece, in the layouts of ValueToString, without
+// building a value tree first: a sheet writes its document through it. Each
+// call returns false once any piece has failed; the text is then lost.
+class ZEL_API Writer {
+public:
+  // Compact text, or indented by two spaces per level when `format` is true.
+  explicit Writer(bool format);
+  ~Writer();
+  Writer(const Writer&) = delete;
+  Writer& operator=(const Writer&) = delete;
+
+  bool StartObject();
+  bool EndObject();
+  bool StartArray();
+  bool EndArray();
+  // A member name; the member's value follows.
+  bool Key(std::u16string_view name);
+  bool String(std::u16string_view text);
+  // A whole value, containers included, as ValueToString writes it.
+  bool Write(const Value& value);
+  // The text once every container is closed; empty when a piece failed or
+  // the text is incomplete.
+  ZelStringT<char16_t> TakeText();
+
+  struct Impl;
+
+private:
+  bool Check(bool written);
+
+  std::unique_ptr<Impl> m_impl;
+};
 
 // Inline definitions that need Value and Member complete.
 

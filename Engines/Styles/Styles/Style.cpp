@@ -1013,26 +1013,75 @@ bool Style::ProcessProperties(const std::vector<std::vector<PropertyKey>>& paths
 // ---------------------------------------------------------------------------
 // JSON
 
+namespace {
+
+// Where Style::SerializeMembers puts the members of a style: a value tree.
+class TreeSink {
+public:
+  explicit TreeSink(Json::Object& object) : m_object(object) {}
+  void Text(const ZelStringT<char16_t>& name, const ZelStringT<char16_t>& text) {
+    m_object.AddValue(name, Json::Value(text));
+  }
+  Json::Value& Value() { return m_value = Json::Value(); }
+  void Member(const ZelStringT<char16_t>& name) { m_object.AddValue(name, std::move(m_value)); }
+
+private:
+  Json::Object& m_object;
+  Json::Value m_value;
+};
+
+// The same members written straight into JSON text.
+class WriterSink {
+public:
+  WriterSink(Json::Writer& writer, Json::Value& scratch) : m_writer(writer), m_value(scratch) {}
+  void Text(const ZelStringT<char16_t>& name, const ZelStringT<char16_t>& text) {
+    m_writer.Key(name.GetView());
+    m_writer.String(text.GetView());
+  }
+  Json::Value& Value() { return m_value; }
+  void Member(const ZelStringT<char16_t>& name) {
+    m_writer.Key(name.GetView());
+    m_writer.Write(m_value);
+  }
+
+private:
+  Json::Writer& m_writer;
+  Json::Value& m_value;
+};
+
+} // namespace
+
+template <class Sink>
+void Style::SerializeMembers(const StyleSheet& sheet, bool includeTemporary, Sink& sink) const {
+  if (const ZelStringT<char16_t>* parentName = sheet.FindStyleName(m_parent))
+    if (!parentName->IsEmpty())
+      sink.Text(k_strPropertyInherits, *parentName);
+  if (!m_externalID.IsEmpty())
+    sink.Text(k_strExternalID, m_externalID);
+  if (!m_externalName.IsEmpty())
+    sink.Text(k_strExternalName, m_externalName);
+  for (const PropertyMap::Entry& entry : m_properties) {
+    const BaseStyleProperty* behaviour = FindBehaviour(entry.first);
+    if (!behaviour || (!includeTemporary && behaviour->IsTemporary()))
+      continue;
+    if (behaviour->Serialize(sheet, this, entry.second, sink.Value()))
+      sink.Member(entry.first.GetString());
+  }
+}
+
 void Style::Serialize(const StyleSheet& sheet, JsonValue& out, bool includeTemporary) const {
   Json::Object& object = out.Emplace<Json::Object>();
   object.Reserve(m_properties.size() + 3);
-  ZelStringT<char16_t> parentName = sheet.GetStyleName(m_parent);
-  if (!parentName.IsEmpty())
-    object.AddValue(k_strPropertyInherits, Json::Value(std::move(parentName)));
-  if (!m_externalID.IsEmpty())
-    object.AddValue(k_strExternalID, Json::Value(m_externalID));
-  if (!m_externalName.IsEmpty())
-    object.AddValue(k_strExternalName, Json::Value(m_externalName));
-  const StyleManager& manager = GetStyleManager();
-  const PropertyKey categoryKey = GetCategoryName();
-  for (const PropertyMap::Entry& entry : m_properties) {
-    const BaseStyleProperty* behaviour = manager.GetStyleProperty(categoryKey, entry.first);
-    if (!behaviour || (!includeTemporary && behaviour->IsTemporary()))
-      continue;
-    Json::Value json;
-    if (behaviour->Serialize(sheet, this, entry.second, json))
-      object.AddValue(entry.first.GetString(), std::move(json));
-  }
+  TreeSink sink(object);
+  SerializeMembers(sheet, includeTemporary, sink);
+}
+
+void Style::WriteJson(const StyleSheet& sheet, Json::Writer& writer, bool includeTemporary,
+                      JsonValue& scratch) const {
+  writer.StartObject();
+  WriterSink sink(writer, scratch);
+  SerializeMembers(sheet, includeTemporary, sink);
+  writer.EndObject();
 }
 
 ZelStringT<char16_t> Style::Serialize(const StyleSheet& sheet, bool format,

@@ -22,6 +22,7 @@
 namespace Json {
 class Value;
 class Object;
+class Writer;
 } // namespace Json
 
 namespace Styles {
@@ -342,6 +343,12 @@ private:
   void AppendValueDependencies(StyleSpan styles, bool parentOnly, std::vector<Style*>& out) const;
 
   friend class StyleSheet;
+  // Hands the members of the style's JSON object to `sink`, in their order.
+  template <class Sink>
+  void SerializeMembers(const StyleSheet& sheet, bool includeTemporary, Sink& sink) const;
+  // Writes the style's JSON object; `scratch` is reused for the values.
+  void WriteJson(const StyleSheet& sheet, Json::Writer& writer, bool includeTemporary,
+                 JsonValue& scratch) const;
   // Appends to `out`, in their order, the styles of `styles` for which
   // HasDependency(span, false) holds, answering every shared ancestor once.
   static void AppendDependents(const std::vector<Style*>& styles, StyleSpan span,

@@ -30,10 +30,14 @@ using Json::Array;
 using Json::Object;
 using Json::Value;
 
+// Parses `text` both into a Value and into a Document, which must agree.
 Value ParseOrFail(const Text& text) {
   Value value;
   Text error;
   EXPECT_TRUE(Json::Parse(text, value, error)) << Show(error) << " in " << Show(text);
+  Json::Document document;
+  EXPECT_TRUE(document.Parse(text, error)) << Show(error) << " in " << Show(text);
+  EXPECT_EQ(document.GetRoot().ToValue(), value);
   return value;
 }
 
@@ -168,6 +172,11 @@ TEST(JsonTest, BadTextFailsAndLeavesValueAlone) {
       EXPECT_FALSE(Json::Parse(text, out, error));
       EXPECT_EQ(out, Value(u"untouched"));
       EXPECT_NE(Show(error).find(" at offset "), std::string::npos) << Show(error);
+      Json::Document document;
+      Text documentError;
+      EXPECT_FALSE(document.Parse(text, documentError));
+      EXPECT_EQ(documentError, error);
+      EXPECT_TRUE(document.GetRoot().IsNull());
     }
   }
 }
