@@ -4,8 +4,13 @@
 #include <Styles/StyleManager.h>
 #include <Styles/StyleProperty.h>
 
+#include "HostBehaviours.h"
+
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <functional>
+#include <memory>
 #include <string>
 
 namespace Styles {
@@ -148,6 +153,72 @@ TEST(StyleUtilitiesTest, StrictModeKeepsExactlyTheAllowedSet) {
   expected.push_back(u'x');
   EXPECT_EQ(kept, ZelStringT<char16_t>(expected));
   EXPECT_EQ(kept.GetLength(), 92u);
+}
+
+using testing::CheckOwnerLinks;
+using testing::Number;
+using ZelUtils::Any;
+
+// Nodes hold a counted mark, a size, two single substyles of their own kind
+// (child, side) and a list of them (items). Every counted value a test makes
+// must be freed exactly once.
+class StyleUtilitiesSubstyleTest : public ::testing::Test {
+protected:
+  StyleUtilitiesSubstyleTest() : node(u"UtilitiesTest.Node") {
+    mark = node.Add(u"mark", new testing::CountingNumberProperty(0.0, &counts));
+    size = node.Number(u"size", 10.0);
+    child = node.Add(u"child", new StyleSetProperty(node.Key()));
+    side = node.Add(u"side", new StyleSetProperty(node.Key()));
+    items = node.Add(u"items", new StyleArrayProperty(PropertyKey::Empty));
+  }
+  ~StyleUtilitiesSubstyleTest() override { EXPECT_EQ(counts.Live(), 0); }
+
+  Style Node(Style* parent = nullptr) const { return Style(parent, node.Key()); }
+  // Depth first in key order is the lexicographic order of the paths.
+  static std::vector<PropertyPath> Sorted(std::vector<PropertyPath> paths) {
+    std::sort(paths.begin(), paths.end());
+    return paths;
+  }
+
+  testing::ValueCounts counts;
+  testing::ScopedCategory node;
+  PropertyKey mark, size, child, side, items;
+};
+
+TEST_F(StyleUtilitiesSubstyleTest, SubStyleHandlesOutliveReplacedSubstyles) {
+  Style root = Node();
+  root.SetPathProperty({child, child, side, mark}, Any(1.0));
+  Style* deep = root.GetSubstyle(child, false)->GetSubstyle(child, false)->GetSubstyle(side, false);
+  const SubStyle handle(deep);
+  EXPECT_EQ(handle.GetRoot(), &root);
+  EXPECT_EQ(handle.GetPath(), PropertyPath({child, child, side}));
+  EXPECT_EQ(SubStylesToStyles({handle, &root, nullptr}),
+            (std::vector<Style*>{deep, &root, nullptr}));
+
+  // Replacing an intermediate substyle frees `deep`; the handle finds the copy.
+  Style replacement = Node();
+  replacement.SetPathProperty({child, side, mark}, Any(2.0));
+  root.SetProperty(child, Any(static_cast<const Style*>(&replacement)));
+  ASSERT_NE(static_cast<Style*>(handle), nullptr);
+  EXPECT_EQ(Number(static_cast<Style*>(handle)->GetProperty(mark)), 2.0);
+  root.GetSubstyle(child, false)->GetSubstyle(child, false)->ClearProperty(side);
+  EXPECT_EQ(static_cast<Style*>(handle), nullptr);
+
+  SubStyle copy = nullptr;
+  copy = handle;
+  const SubStyle moved(std::move(copy));
+  EXPECT_EQ(moved.GetPath(), handle.GetPath());
+  EXPECT_EQ(copy.GetRoot(), nullptr);
+  EXPECT_TRUE(copy.GetPath().empty());
+
+  // A list element linked to its owner (as a host's behaviour may do) gets a
+  // path without index, which resolves to nothing.
+  root.SetProperty(items, std::vector<Style*>{&replacement});
+  Style* element = root.GetProperty(items).Get<std::vector<Style*>>()[0];
+  element->SetOwner(&root, items);
+  const std::vector<SubStyle> handles = StylesToSubStyles({element});
+  EXPECT_EQ(handles[0].GetPath(), PropertyPath{items});
+  EXPECT_EQ(SubStylesToStyles(handles), std::vector<Style*>{nullptr});
 }
 
 } // namespace

@@ -6,7 +6,11 @@
 
 #include <ZelUtils/String.h>
 
+#include <algorithm>
+#include <cassert>
+#include <cstring>
 #include <memory>
+#include <typeinfo>
 #include <utility>
 
 namespace Styles {
@@ -113,6 +117,55 @@ ZelStringT<char16_t> ConvertToValidStyleName(const ZelStringT<char16_t>& name,
           : ZelUtils::String::RemoveCharacters(name, kRemovedNameCharacters);
   result.Trim();
   return result;
+}
+
+// ---------------------------------------------------------------------------
+// Lasting handles of substyles
+
+SubStyle::SubStyle(Style* style) : m_root(style) {
+  if (!style)
+    return;
+  for (const Style* current = style; current->GetOwner(); current = current->GetOwner()) {
+    m_path.push_back(current->GetOwnerPropertyKey());
+    m_root = current->GetOwner();
+  }
+  std::reverse(m_path.begin(), m_path.end());
+}
+
+SubStyle::SubStyle(const SubStyle& other) : m_root(other.m_root), m_path(other.m_path) {}
+
+SubStyle::SubStyle(SubStyle&& other) noexcept
+    : m_root(std::exchange(other.m_root, nullptr)), m_path(std::move(other.m_path)) {
+  other.m_path.clear();
+}
+
+SubStyle& SubStyle::operator=(const SubStyle& other) {
+  m_root = other.m_root;
+  if (this != &other)
+    m_path = other.m_path;
+  return *this;
+}
+
+SubStyle::operator Style*() const {
+  Style* style = m_root;
+  for (auto key = m_path.begin(); style && key != m_path.end(); ++key)
+    style = style->GetSubstyle(*key, false);
+  return style;
+}
+
+std::vector<SubStyle> StylesToSubStyles(const std::vector<Style*>& styles) {
+  std::vector<SubStyle> subStyles;
+  for (Style* style : styles)
+    subStyles.push_back(SubStyle(style));
+  return subStyles;
+}
+
+std::vector<Style*> SubStylesToStyles(const std::vector<SubStyle>& subStyles) {
+  std::vector<Style*> styles;
+  styles.reserve(subStyles.size());
+  for (const SubStyle& subStyle : subStyles)
+    styles.push_back(subStyle);
+  return styles;
 }
 
 } // namespace Styles

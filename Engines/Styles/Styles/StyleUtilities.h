@@ -1,12 +1,14 @@
 // Free functions of the style library: registration of substyle properties
 // and of the category of ordinary styles, property paths (sequences of keys
 // that lead through substyles to a property), the category key of ordinary
-// styles and the cleaning of user-typed style names.
+// styles, the cleaning of user-typed style names, and lasting handles of
+// substyles.
 #pragma once
 
 #include <Styles/Export.h>
 #include <Styles/Style.h>
 
+#include <functional>
 #include <set>
 #include <vector>
 
@@ -58,5 +60,40 @@ STYLES_API Style* GetOrCreateSubstyle(Style& style, const PropertyKey& setKey);
 // the ends afterwards; the result may be empty.
 STYLES_API ZelStringT<char16_t> ConvertToValidStyleName(const ZelStringT<char16_t>& name,
                                                         bool restrictToAllowedCharacters);
+
+// ---------------------------------------------------------------------------
+// Lasting handles of substyles
+
+// A handle of a substyle that survives edits of its owners: the outermost
+// owner (the root) and the owner keys from it down to the substyle. It owns
+// only its path; the root must outlive every resolution.
+class STYLES_API SubStyle {
+public:
+  // The handle of `style` (implicit on purpose, so lists convert); a null
+  // style gives an empty handle, a top-level style an empty path.
+  SubStyle(Style* style);
+  SubStyle(const SubStyle& other);
+  // Leaves `other` empty: null root, empty path.
+  SubStyle(SubStyle&& other) noexcept;
+  SubStyle& operator=(const SubStyle& other);
+
+  // The substyle now found from the root along the path through own single
+  // substyles, or null; never creates or changes a style. A handle of an
+  // element of a substyle list resolves to null: the path holds no index.
+  operator Style*() const;
+
+  Style* GetRoot() const noexcept { return m_root; }
+  // The owner keys, outermost first.
+  const PropertyPath& GetPath() const noexcept { return m_path; }
+
+private:
+  Style* m_root;
+  PropertyPath m_path;
+};
+
+// One handle per style, in order; null styles give empty handles.
+STYLES_API std::vector<SubStyle> StylesToSubStyles(const std::vector<Style*>& styles);
+// One resolved pointer per handle, in order; null entries are kept.
+STYLES_API std::vector<Style*> SubStylesToStyles(const std::vector<SubStyle>& subStyles);
 
 } // namespace Styles
