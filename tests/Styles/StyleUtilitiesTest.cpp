@@ -221,5 +221,27 @@ TEST_F(StyleUtilitiesSubstyleTest, SubStyleHandlesOutliveReplacedSubstyles) {
   EXPECT_EQ(SubStylesToStyles(handles), std::vector<Style*>{nullptr});
 }
 
+TEST_F(StyleUtilitiesSubstyleTest, OverriddenPathsListOwnLeavesDepthFirst) {
+  Style list = Node();
+  Style style = Node();
+  style.SetProperty(size, Any(1.0));
+  style.SetPathProperty({child, mark}, Any(2.0));
+  style.SetPathProperty({child, side, size}, Any(3.0));
+  GetOrCreateSubstyle(style, side); // empty: no path, not even [side]
+  style.SetProperty(items, std::vector<Style*>{&list});
+  EXPECT_EQ(GetOverriddenPropertyPaths(style),
+            Sorted({{size}, {items}, {child, mark}, {child, side, size}}));
+  EXPECT_EQ(GetOverriddenProperties(style), (std::set<PropertyKey>{size, child, side, items}));
+  EXPECT_TRUE(GetOverriddenPropertyPaths(list).empty());
+  EXPECT_EQ(GetStyleCategoryProperties(list).size(), 5u);
+
+  // One level only: the inner substyle gives its key.
+  EXPECT_EQ(GetOverriddenSubstyleProperties(style, child, true),
+            Sorted({{child, mark}, {child, side}}));
+  EXPECT_EQ(GetOverriddenSubstyleProperties(style, child, false), Sorted({{mark}, {side}}));
+  EXPECT_TRUE(GetOverriddenSubstyleProperties(style, side, true).empty());
+  EXPECT_TRUE(GetOverriddenSubstyleProperties(style, items, true).empty());
+}
+
 } // namespace
 } // namespace Styles

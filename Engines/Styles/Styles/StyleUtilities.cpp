@@ -168,4 +168,72 @@ std::vector<Style*> SubStylesToStyles(const std::vector<SubStyle>& subStyles) {
   return styles;
 }
 
+// ---------------------------------------------------------------------------
+// Overridden properties
+
+namespace {
+
+// Whether `value` holds exactly the kind Style*: the type names are compared
+// by address first, then by text, so a kind made in a host library counts.
+bool HoldsSubstyleKind(const ZelUtils::Any& value) {
+  const std::type_info& held = value.Type();
+  const std::type_info& wanted = typeid(Style*);
+  return held.name() == wanted.name() || std::strcmp(held.name(), wanted.name()) == 0;
+}
+
+// The substyle held by a value of the substyle kind; std::bad_cast when the
+// value cannot be read as one.
+Style* HeldSubstyle(const ZelUtils::Any& value) {
+  if (!value.IsTypeCompatible<Style*>())
+    throw std::bad_cast();
+  return value.Get<Style*>();
+}
+
+} // namespace
+
+std::set<PropertyKey> GetStyleCategoryProperties(const Style& style) {
+  const std::shared_ptr<const StyleCategory> category = style.GetCategory();
+  assert(category && "a style without category has no properties to list");
+  std::set<PropertyKey> keys;
+  for (const auto& entry : category->GetProperties())
+    keys.insert(keys.end(), entry.first);
+  return keys;
+}
+
+std::set<PropertyKey> GetOverriddenProperties(const Style& style) {
+  std::set<PropertyKey> keys;
+  for (const PropertyMap::Entry& entry : style.GetProperties())
+    keys.insert(keys.end(), entry.first);
+  return keys;
+}
+
+std::vector<PropertyPath> GetOverriddenPropertyPaths(const Style& style) {
+  std::vector<PropertyPath> paths;
+  GetOverriddenPropertyPaths(style, PropertyPath(), paths);
+  return paths;
+}
+
+void GetOverriddenPropertyPaths(const Style& style, const PropertyPath& prefix,
+                                std::vector<PropertyPath>& paths) {
+  for (const PropertyMap::Entry& entry : style.GetProperties()) {
+    if (!HoldsSubstyleKind(entry.second)) {
+      paths.push_back(MakePath(prefix, entry.first));
+      continue;
+    }
+    if (const Style* substyle = HeldSubstyle(entry.second))
+      GetOverriddenPropertyPaths(*substyle, MakePath(prefix, entry.first), paths);
+  }
+}
+
+std::vector<PropertyPath>
+GetOverriddenSubstyleProperties(const Style& style, const PropertyKey& setKey, bool includeSetKey) {
+  std::vector<PropertyPath> paths;
+  const Style* substyle = style.GetSubstyle(setKey, false);
+  if (!substyle)
+    return paths;
+  for (const PropertyMap::Entry& entry : substyle->GetProperties())
+    paths.push_back(includeSetKey ? MakePath(setKey, entry.first) : MakePath(entry.first));
+  return paths;
+}
+
 } // namespace Styles

@@ -1,8 +1,8 @@
 // Free functions of the style library: registration of substyle properties
 // and of the category of ordinary styles, property paths (sequences of keys
 // that lead through substyles to a property), the category key of ordinary
-// styles, the cleaning of user-typed style names, and lasting handles of
-// substyles.
+// styles, the cleaning of user-typed style names, lasting handles of
+// substyles and the queries of overridden properties.
 #pragma once
 
 #include <Styles/Export.h>
@@ -95,5 +95,27 @@ private:
 STYLES_API std::vector<SubStyle> StylesToSubStyles(const std::vector<Style*>& styles);
 // One resolved pointer per handle, in order; null entries are kept.
 STYLES_API std::vector<Style*> SubStylesToStyles(const std::vector<SubStyle>& subStyles);
+
+// ---------------------------------------------------------------------------
+// Overridden properties
+
+// Every key registered in the style's category, which must exist.
+STYLES_API std::set<PropertyKey> GetStyleCategoryProperties(const Style& style);
+// The keys the style sets itself, whatever their values.
+STYLES_API std::set<PropertyKey> GetOverriddenProperties(const Style& style);
+// The paths of the leaf values the style sets itself, depth first in key
+// order: an own single substyle stands for the paths of its own values (none
+// when it is empty); a substyle list is a leaf. Throws std::bad_cast only
+// for a value of the substyle kind that cannot be read as one.
+STYLES_API std::vector<PropertyPath> GetOverriddenPropertyPaths(const Style& style);
+// Appends the same paths, each after `prefix`; on an exception the paths
+// appended so far stay.
+STYLES_API void GetOverriddenPropertyPaths(const Style& style, const PropertyPath& prefix,
+                                           std::vector<PropertyPath>& paths);
+// One path per value set by the own single substyle under `setKey`, one
+// level deep: [setKey, key] with `includeSetKey`, else [key]. Empty when
+// there is no own single substyle.
+STYLES_API std::vector<PropertyPath>
+GetOverriddenSubstyleProperties(const Style& style, const PropertyKey& setKey, bool includeSetKey);
 
 } // namespace Styles
