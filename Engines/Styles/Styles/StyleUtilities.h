@@ -1,8 +1,8 @@
 // Free functions of the style library: registration of substyle properties
 // and of the category of ordinary styles, property paths (sequences of keys
 // that lead through substyles to a property), the category key of ordinary
-// styles, the cleaning of user-typed style names, lasting handles of
-// substyles and the queries of overridden properties.
+// styles, the cleaning of user-typed style names, and the substyle helpers:
+// lasting handles, overridden-property queries and substyle edits.
 #pragma once
 
 #include <Styles/Export.h>
@@ -117,5 +117,71 @@ STYLES_API void GetOverriddenPropertyPaths(const Style& style, const PropertyPat
 // there is no own single substyle.
 STYLES_API std::vector<PropertyPath>
 GetOverriddenSubstyleProperties(const Style& style, const PropertyKey& setKey, bool includeSetKey);
+
+// ---------------------------------------------------------------------------
+// Substyle helpers
+
+// The effective value of `key` in the effective substyle under `setKey`,
+// which must not be null. Throws std::bad_cast when that value is not a
+// substyle.
+STYLES_API const ZelUtils::Any& GetSubstyleProperty(const Style& style, const PropertyKey& setKey,
+                                                    const PropertyKey& key);
+// Copies the same value into `out`; false, `out` untouched, when `setKey` or
+// `key` resolves only to a default or is unregistered. Throws std::bad_cast
+// like the form above.
+STYLES_API bool GetSubstyleProperty(const Style& style, const PropertyKey& setKey,
+                                    const PropertyKey& key, ZelUtils::Any& out);
+// Sets `key` in the style's own substyle under `setKey`. Without one, an own
+// substyle of `category` is created first, holding only this value: an
+// inherited substyle is never written through. Throws std::bad_cast when the
+// own value under `setKey` is not a substyle (a value created for it stays).
+STYLES_API void SetSubstyleProperty(Style& style, const PropertyKey& category,
+                                    const PropertyKey& setKey, const PropertyKey& key,
+                                    const ZelUtils::Any& value);
+// Clears `key` in the style's own substyle under `setKey`, if any; the
+// substyle stays even when it becomes empty (see ClearEmptySubstyles).
+// Throws std::bad_cast when the own value is not a substyle.
+STYLES_API void ClearSubstyleProperty(Style& style, const PropertyKey& setKey,
+                                      const PropertyKey& key);
+// The style itself when its category is named `key`, else its substyle
+// under `key` (Style::GetSubstyle with `inherited`); null for a null style.
+STYLES_API const Style* GetStyleOrSubstyle(const Style* style, const PropertyKey& key,
+                                           bool inherited);
+STYLES_API Style* GetStyleOrSubstyle(Style* style, const PropertyKey& key, bool inherited);
+// The style's parent; for a parentless substyle, the parent of the substyle
+// under the same key in the nearest of its owner and the owner's ancestors
+// that has one; else null. Not owned.
+STYLES_API Style* GetSubstyleParent(const Style& style);
+// A new free style that resolves as the effective substyle of `style` under
+// `setKey` does, without owners: it gets the substyle's (owner-inherited)
+// parent and, as own values, every effective value not found where that
+// parent finds it. `categoryKeys` becomes the keys of the substyle's
+// category. Null, `categoryKeys` untouched, without a substyle; null also
+// for a substyle without category. The caller owns the result.
+STYLES_API Style*
+CreateStyleFromSubstyleWithoutOwnerDependencies(const Style* style, const PropertyKey& setKey,
+                                                std::set<PropertyKey>& categoryKeys);
+// Removes the own values equal to what the style would inherit without them,
+// and those without behaviour. Nothing changes when neither the style nor
+// any of its owners has a parent. On an exception the values not yet put
+// back are lost.
+STYLES_API void ClearMatchingInheritedProperties(Style& style);
+// Calls `fn` on the style (with `includeSelf`), then on its own single
+// substyles under `keys` in that order, or under every key of its category
+// in registration order when `keys` is empty. One level deep only; false as
+// soon as `fn` returns false; true for a null style.
+STYLES_API bool ForEachSubStyle(Style* style, const std::function<bool(Style*)>& fn,
+                                bool includeSelf, std::vector<PropertyKey> keys);
+// Removes, depth first, every own single substyle that holds no own values,
+// also one that becomes empty because its substyles were removed. Substyle
+// lists are left alone.
+STYLES_API void ClearEmptySubstyles(Style& style);
+// For every key that `destination` sets itself and under which `source` has
+// an own single substyle: with `mergeProperties`, the source substyle's own
+// values are set on the destination's substyle (which must be one); without,
+// the destination's value is replaced by a copy of the source substyle.
+STYLES_API void CopySourceSubstylesThatExistsInDestinationStyle(Style* destination,
+                                                                const Style* source,
+                                                                bool mergeProperties);
 
 } // namespace Styles
