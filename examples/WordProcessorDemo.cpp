@@ -4,8 +4,12 @@
 // sheet with a few levels of inheritance, edits a property along a path,
 // deletes a style in the middle of a chain, writes the sheet to a JSON file,
 // reads the file into a new sheet and prints what every style resolves to.
+// Last it saves two styles as presets in a folder, reads them back through a
+// new preset manager and applies one to a new style.
 //
-// Usage: WordProcessorDemo [file.json]   (default: a file in the temp folder)
+// Usage: WordProcessorDemo [file.json]   (default: a file in the temp folder;
+// the presets always go to WordProcessorDemoPresets in the temp folder)
+#include <Styles/FolderPresetManager.h>
 #include <Styles/StyleManager.h>
 #include <Styles/StyleProperty.h>
 #include <Styles/StyleSheet.h>
@@ -246,6 +250,65 @@ void PrintPathValue(const Style& style, const char16_t* path) {
               substyle ? Origin(*substyle, keys[1]) : "no substyle");
 }
 
+// `path` as dotted text, as SplitPath reads it.
+std::string JoinPath(const Styles::PropertyPath& path) {
+  std::string text;
+  for (const PropertyKey& key : path)
+    text += (text.empty() ? "" : ".") + ToUtf8(key.GetString());
+  return text;
+}
+
+// Saves Heading 1 and Strong Emphasis of `sheet` as presets of a set in
+// `folder`, reads the set back through a new manager and gives a new style
+// the values of one preset.
+int RunPresets(const StyleSheet& sheet, const std::filesystem::path& folder) {
+  const Text setName(u"Word Processor");
+  std::filesystem::create_directories(folder);
+  {
+    Styles::FolderPresetManager presets(FromUtf8(folder.string()));
+    const std::filesystem::path file = folder / ToUtf8(presets.GetFileName(setName));
+    // A set file left by an earlier run would stop CreatePresetSet.
+    std::error_code ignored;
+    std::filesystem::remove(file, ignored);
+    if (!presets.CreatePresetSet(setName)) {
+      std::fprintf(stderr, "Cannot create a preset set in %s\n", folder.string().c_str());
+      return 1;
+    }
+    // Each preset is a copy folded with its parents; the sheet is not changed.
+    for (const char16_t* name : {u"Heading 1", u"Strong Emphasis"})
+      presets.AddPreset(setName, name, sheet.GetStyle(name), false);
+    std::printf("\nSaved 2 presets to %s\n", file.string().c_str());
+  }
+
+  Styles::FolderPresetManager presets(FromUtf8(folder.string()));
+  std::printf("Read back by a new manager:");
+  for (const Text& name : presets.GetPresetNames(setName))
+    std::printf(" \"%s\"", ToUtf8(name).c_str());
+  std::printf("\n");
+  const Style* preset = presets.GetPreset(setName, u"Heading 1");
+  if (!preset) {
+    std::fprintf(stderr, "Cannot read the preset set back\n");
+    return 1;
+  }
+
+  // A new style takes the preset's values; the paths of what it now sets
+  // itself lead into its own character substyle.
+  Style title(nullptr, kParagraph);
+  title.MergeProperties(preset, true);
+  std::printf("A new paragraph style merged with the preset \"Heading 1\" sets:\n");
+  Styles::StyleManager& manager = Styles::GetStyleManager();
+  for (const Styles::PropertyPath& path : Styles::GetOverriddenPropertyPaths(title)) {
+    const Style* holder = &title;
+    for (std::size_t i = 0; i + 1 < path.size(); ++i)
+      holder = holder->GetSubstyle(path[i], false);
+    const ZelPref::ConversionPolicy* policy =
+        manager.GetConversionPolicy(holder->GetCategoryName(), path.back());
+    std::printf("  %s = %s\n", JoinPath(path).c_str(),
+                ToUtf8(policy->ToText(title.GetPathProperty(path))).c_str());
+  }
+  return 0;
+}
+
 int Run(const Text& path) {
   {
     StyleSheet sheet;
@@ -295,7 +358,7 @@ int Run(const Text& path) {
   for (const PropertyKey& category : {kParagraph, kCharacter, kTable})
     for (const Style* style : loaded.GetStylesByCategory(category))
       PrintStyle(loaded, *style);
-  return 0;
+  return RunPresets(loaded, std::filesystem::temp_directory_path() / "WordProcessorDemoPresets");
 }
 
 } // namespace
