@@ -94,6 +94,9 @@ ZelStringT<char16_t> Widen(std::string_view ascii) {
   return ZelStringT<char16_t>(std::u16string(ascii.begin(), ascii.end()));
 }
 
+// The reader validates the text's UTF-16, and an escaped lone surrogate
+// trips one of its checks, so no handler sees an unpaired surrogate.
+
 // SAX handler that builds the value tree. Members of open objects wait on one
 // stack, elements of open arrays on another; each value is built in its slot.
 // When a container closes its children are moved into a vector of exactly
@@ -126,14 +129,10 @@ public:
     return Number(number);
   }
   bool String(const Ch* text, SizeType length, bool) {
-    if (HasUnpairedSurrogate(std::u16string_view(text, length)))
-      return Fail("Unpaired surrogate in string");
     NextSlot().Emplace<ZelStringT<char16_t>>(text, length);
     return true;
   }
   bool Key(const Ch* text, SizeType length, bool) {
-    if (HasUnpairedSurrogate(std::u16string_view(text, length)))
-      return Fail("Unpaired surrogate in member name");
     m_members.emplace_back();
     m_members.back().name.GetStdString().assign(text, length);
     return true;
@@ -386,15 +385,9 @@ public:
     return Number(number);
   }
   bool String(const Ch* text, SizeType length, bool) {
-    if (HasUnpairedSurrogate(std::u16string_view(text, length)))
-      return Fail("Unpaired surrogate in string");
     return Push(Text(Node::kString, text, length));
   }
-  bool Key(const Ch* text, SizeType length, bool) {
-    if (HasUnpairedSurrogate(std::u16string_view(text, length)))
-      return Fail("Unpaired surrogate in member name");
-    return Push(Text(Node::kName, text, length));
-  }
+  bool Key(const Ch* text, SizeType length, bool) { return Push(Text(Node::kName, text, length)); }
   bool StartObject() { return Enter(); }
   bool StartArray() { return Enter(); }
   bool EndObject(SizeType memberCount) { return Leave(Node::kObject, memberCount, 2); }
@@ -469,6 +462,9 @@ bool Document::Parse(const ZelStringT<char16_t>& text, ZelStringT<char16_t>& err
   const std::size_t skipped = ByteOrderMarkLength(text);
   m_buffer.assign(text.GetView().substr(skipped));
   m_nodes.clear();
+  // Documents of styles spend about ten units of text on a node; one guess
+  // saves most of the array's growth steps.
+  m_nodes.reserve(m_buffer.size() / 8 + 16);
   DocumentBuilder builder(m_nodes);
   if (!RunReader(m_buffer, skipped, builder, errorText)) {
     m_buffer.clear();
@@ -517,9 +513,56 @@ void Document::Ref::AssignTo(Value& out) const {
   out = ToValue();
 }
 
+namespace {
+
+// RapidJSON's output stream into a buffer that grows geometrically and is
+// never cleared first (a string's resize would fill it with zeros); the
+// finished text is copied out once, at its exact length.
+class TextOutput {
+public:
+  using Ch = char16_t;
+  void Put(Ch c) {
+    if (m_size == m_capacity)
+      Grow(1);
+    m_units[m_size++] = c;
+  }
+  void PutUnsafe(Ch c) { m_units[m_size++] = c; }
+  void Reserve(std::size_t count) {
+    if (count > m_capacity - m_size)
+      Grow(count);
+  }
+  void Flush() {}
+  std::u16string Take() {
+    std::u16string text(m_units.get(), m_size);
+    m_units.reset();
+    m_size = m_capacity = 0;
+    return text;
+  }
+
+private:
+  void Grow(std::size_t count) {
+    const std::size_t capacity = std::max(m_capacity * 2, m_size + count + 1024);
+    std::unique_ptr<char16_t[]> units(new char16_t[capacity]);
+    std::copy(m_units.get(), m_units.get() + m_size, units.get());
+    m_units = std::move(units);
+    m_capacity = capacity;
+  }
+
+  std::unique_ptr<char16_t[]> m_units;
+  std::size_t m_size = 0;
+  std::size_t m_capacity = 0;
+};
+
+// Found by the writer through the stream's namespace: room for `count` units,
+// then units put without a check.
+inline void PutReserve(TextOutput& stream, std::size_t count) { stream.Reserve(count); }
+inline void PutUnsafe(TextOutput& stream, char16_t c) { stream.PutUnsafe(c); }
+
+} // namespace
+
 // What Writer forwards to: a RapidJSON writer of either layout.
 struct Writer::Impl {
-  using Buffer = rapidjson::GenericStringBuffer<Utf16>;
+  using Buffer = TextOutput;
   virtual ~Impl() = default;
   virtual bool StartObject() = 0;
   virtual bool EndObject() = 0;
@@ -582,11 +625,13 @@ bool Writer::String(std::u16string_view text) {
 }
 bool Writer::Write(const Value& value) { return Check(!m_impl->failed && m_impl->Write(value)); }
 
+void Writer::Reserve(std::size_t units) { m_impl->buffer.Reserve(units); }
+
 ZelStringT<char16_t> Writer::TakeText() {
   Impl& impl = *m_impl;
   if (impl.failed || !impl.IsComplete() || g_failedChecks != impl.failedChecks)
     return ZelStringT<char16_t>();
-  return ZelStringT<char16_t>(impl.buffer.GetString(), impl.buffer.GetSize() / sizeof(char16_t));
+  return ZelStringT<char16_t>(impl.buffer.Take());
 }
 
 ZelStringT<char16_t> ValueToString(const Value& value, bool format) {

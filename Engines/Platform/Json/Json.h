@@ -277,6 +277,8 @@ public:
   bool String(std::u16string_view text);
   // A whole value, containers included, as ValueToString writes it.
   bool Write(const Value& value);
+  // Makes room for `units` more UTF-16 units of text: a hint, never needed.
+  void Reserve(std::size_t units);
   // The text once every container is closed; empty when a piece failed or
   // the text is incomplete.
   ZelStringT<char16_t> TakeText();

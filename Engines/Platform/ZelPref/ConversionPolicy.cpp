@@ -1,8 +1,11 @@
 #include <ZelPref/ConversionPolicy.h>
 
+#include <algorithm>
 #include <charconv>
 #include <climits>
 #include <cmath>
+#include <cstdlib>
+#include <cstring>
 #include <string>
 #include <string_view>
 #include <system_error>
@@ -27,19 +30,21 @@ bool IsDigit(char c) noexcept { return c >= '0' && c <= '9'; }
 
 // The text without surrounding ASCII white space, narrowed to 8 bits; throws
 // when any character is outside ASCII (no number or flag form uses one).
+// Short texts, as numbers are, stay in the string's own buffer.
 std::string TrimmedAscii(const ZelStringT<char16_t>& text) {
   std::u16string_view view = text;
   while (!view.empty() && view.front() < 0x80 && IsAsciiSpace(static_cast<char>(view.front())))
     view.remove_prefix(1);
   while (!view.empty() && view.back() < 0x80 && IsAsciiSpace(static_cast<char>(view.back())))
     view.remove_suffix(1);
-  std::string ascii;
-  ascii.reserve(view.size());
-  for (const char16_t c : view) {
-    if (c >= 0x80)
-      Fail();
-    ascii.push_back(static_cast<char>(c));
+  std::string ascii(view.size(), '\0');
+  char16_t outside = 0;
+  for (std::size_t i = 0; i < view.size(); ++i) {
+    outside |= view[i] & 0xFF80;
+    ascii[i] = static_cast<char>(view[i]);
   }
+  if (outside)
+    Fail();
   return ascii;
 }
 
@@ -86,6 +91,80 @@ ZelStringT<char16_t> Widen(const char* first, const char* last) {
   return ZelStringT<char16_t>(std::u16string(first, last));
 }
 
+// The number of decimal digits of `value`.
+int DigitCount(unsigned long long value) {
+  int count = 1;
+  while (value >= 10) {
+    value /= 10;
+    ++count;
+  }
+  return count;
+}
+
+// std::to_chars' shortest text for the numbers documents mostly hold, whole
+// or with at most three decimals, without its general algorithm. Writes into
+// `out` (room for 32) and returns the end, or null for any other number.
+char* ShortDecimal(double value, char* out) {
+  if (value == 0) {
+    if (std::signbit(value))
+      *out++ = '-';
+    *out++ = '0';
+    return out;
+  }
+  const double scaled = value * 1000.0;
+  if (!(std::fabs(scaled) < 1e15) || std::nearbyint(scaled) != scaled)
+    return nullptr;
+  const long long thousandths = static_cast<long long>(scaled);
+  // Exactly the double that the decimal reads back as: with at most fifteen
+  // significant digits no shorter decimal reads back the same.
+  if (static_cast<double>(thousandths) / 1000.0 != value)
+    return nullptr;
+  unsigned long long magnitude = thousandths < 0
+                                     ? 0ull - static_cast<unsigned long long>(thousandths)
+                                     : static_cast<unsigned long long>(thousandths);
+  int decimals = 3;
+  while (decimals > 0 && magnitude % 10 == 0) {
+    magnitude /= 10;
+    --decimals;
+  }
+  // to_chars writes the exponent form when it is shorter than the fixed one.
+  unsigned long long significant = magnitude;
+  while (significant % 10 == 0)
+    significant /= 10;
+  const int digits = DigitCount(magnitude);
+  const int significantDigits = DigitCount(significant);
+  const int fixedLength = decimals > 0 ? std::max(digits, decimals + 1) + 1 : digits;
+  const int exponent = digits - 1 - decimals;
+  const int exponentDigits = std::abs(exponent) >= 100 ? 3 : 2;
+  const int scientificLength =
+      significantDigits + (significantDigits > 1 ? 1 : 0) + 2 + exponentDigits;
+  if (fixedLength > scientificLength)
+    return nullptr;
+  if (value < 0)
+    *out++ = '-';
+  char digitsText[24];
+  const int written = static_cast<int>(
+      std::to_chars(digitsText, digitsText + sizeof digitsText, magnitude).ptr - digitsText);
+  if (decimals == 0) {
+    std::memcpy(out, digitsText, static_cast<std::size_t>(written));
+    return out + written;
+  }
+  const int wholeDigits = written - decimals;
+  if (wholeDigits <= 0) {
+    *out++ = '0';
+    *out++ = '.';
+    for (int i = wholeDigits; i < 0; ++i)
+      *out++ = '0';
+    std::memcpy(out, digitsText, static_cast<std::size_t>(written));
+    return out + written;
+  }
+  std::memcpy(out, digitsText, static_cast<std::size_t>(wholeDigits));
+  out += wholeDigits;
+  *out++ = '.';
+  std::memcpy(out, digitsText + wholeDigits, static_cast<std::size_t>(decimals));
+  return out + decimals;
+}
+
 } // namespace
 
 ConversionPolicy::~ConversionPolicy() = default;
@@ -97,6 +176,8 @@ ZelStringT<char16_t> NumberConversionPolicy::ToText(const ZelUtils::Any& value) 
   if (!number || !std::isfinite(*number))
     Fail();
   char buffer[64];
+  if (const char* end = ShortDecimal(*number, buffer))
+    return Widen(buffer, end);
   const std::to_chars_result result = std::to_chars(buffer, buffer + sizeof buffer, *number);
   if (result.ec != std::errc())
     Fail();

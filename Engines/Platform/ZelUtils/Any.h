@@ -98,7 +98,9 @@ using StoredKind =
 } // namespace detail
 
 class Any {
-  static constexpr std::size_t kInlineSize = 3 * sizeof(void*);
+  // Room for a pointer triple or a standard string, so that text values live
+  // inline like numbers.
+  static constexpr std::size_t kInlineSize = 4 * sizeof(void*);
   static constexpr std::size_t kInlineAlign = alignof(double);
 
   template <class T>

@@ -6,6 +6,8 @@
 #include <Styles/StyleSheet.h>
 #include <Styles/StyleUtilities.h>
 
+#include <Styles/Internal/JsonAccess.h>
+
 #include <Json/Json.h>
 
 #include <algorithm>
@@ -1099,57 +1101,76 @@ bool Style::IsAncestorOrSelf(const Style* style) const noexcept {
 }
 
 void Style::DeserializeJson(const StyleSheet& sheet, const Json::Object& object) {
-  StyleManager& manager = GetStyleManager();
-  const PropertyKey categoryKey = GetCategoryName();
-  std::vector<std::pair<const BaseStyleProperty*, const Json::Value*>> deprecated;
+  JsonValue scratch;
+  ReadMembers<detail::TreeAccess>(sheet, object, scratch);
+}
+
+template <class Access>
+void Style::ReadMembers(const StyleSheet& sheet, const typename Access::Object& object,
+                        JsonValue& scratch) {
+  const std::shared_ptr<const StyleCategory> category = m_category;
+  std::vector<std::pair<const BaseStyleProperty*, typename Access::Value>> deprecated;
   std::vector<const BaseStyleProperty*> needAdjustment;
-  for (std::size_t i = 0; i < object.GetSize(); ++i) {
-    const ZelStringT<char16_t>& name = object.GetValueName(i);
-    const Json::Value& value = object.GetValue(i);
-    if (name == k_strPropertyInherits) {
-      const ZelStringT<char16_t>* parentName = value.GetIf<ZelStringT<char16_t>>();
-      if (!parentName || parentName->IsEmpty())
+  const std::size_t count = Access::Size(object);
+  m_properties.Reserve(m_properties.size() + count);
+  for (std::size_t i = 0; i < count; ++i) {
+    const std::u16string_view name = Access::Name(object, i);
+    const typename Access::Value value = Access::Member(object, i);
+    if (name == k_strPropertyInherits.GetView()) {
+      const std::optional<std::u16string_view> parentName = Access::AsString(value);
+      if (!parentName || parentName->empty())
         continue;
-      const WImportStyleInfo& info = manager.GetImportStyleInfo();
-      if (info.names.count(*parentName))
-        continue;
-      const auto renamed = info.renames.find(*parentName);
-      Style* parent = sheet.GetStyle(renamed != info.renames.end() ? renamed->second : *parentName);
+      Style* parent = ResolveParent(sheet, *parentName);
       // Never this style itself, nor a style that already inherits from it:
       // a parent cycle would make every lookup endless.
       if (parent && sheet.AcceptParent(*this, *parent))
         m_parent = parent;
-    } else if (name == k_strExternalID) {
-      const ZelStringT<char16_t>* id = value.GetIf<ZelStringT<char16_t>>();
-      if (id && !id->IsEmpty())
-        SetExternalID(*id);
-    } else if (name == k_strExternalName) {
-      const ZelStringT<char16_t>* externalName = value.GetIf<ZelStringT<char16_t>>();
-      if (externalName && !externalName->IsEmpty())
-        SetExternalName(*externalName);
+    } else if (name == k_strExternalID.GetView()) {
+      const std::optional<std::u16string_view> id = Access::AsString(value);
+      if (id && !id->empty())
+        SetExternalID(ZelStringT<char16_t>(*id));
+    } else if (name == k_strExternalName.GetView()) {
+      const std::optional<std::u16string_view> externalName = Access::AsString(value);
+      if (externalName && !externalName->empty())
+        SetExternalName(ZelStringT<char16_t>(*externalName));
     } else {
-      // A name that is not pooled yet cannot be a registered property; looking
-      // it up without adding it keeps documents from growing the pool.
-      const std::optional<PropertyKey> key = PropertyKey::Find(name.GetView());
-      const BaseStyleProperty* behaviour =
-          key ? manager.GetStyleProperty(categoryKey, *key) : nullptr;
+      // Found by its text, so that names from documents are never pooled.
+      const BaseStyleProperty* behaviour = category ? category->FindStyleProperty(name) : nullptr;
       if (!behaviour)
         continue;
       if (behaviour->IsDeprecated()) {
-        deprecated.emplace_back(behaviour, &value);
+        deprecated.emplace_back(behaviour, value);
         continue;
       }
-      behaviour->Deserialize(sheet, this, value);
+      behaviour->Deserialize(sheet, this, Access::ForBehaviour(value, scratch));
       if (behaviour->NeedAdjustementsForStyleIO())
         needAdjustment.push_back(behaviour);
     }
   }
   // Deprecated properties are read after all current ones, deliberately.
   for (const auto& [behaviour, value] : deprecated)
-    behaviour->Deserialize(sheet, this, *value);
+    behaviour->Deserialize(sheet, this, Access::ForBehaviour(value, scratch));
   for (const BaseStyleProperty* behaviour : needAdjustment)
     behaviour->AdjustAfterDeserialize(sheet, this);
 }
+
+Style* Style::ResolveParent(const StyleSheet& sheet, std::u16string_view name) {
+  const WImportStyleInfo& info = GetStyleManager().GetImportStyleInfo();
+  if (!info.names.empty() || !info.renames.empty()) {
+    const ZelStringT<char16_t> text(name);
+    if (info.names.count(text))
+      return nullptr;
+    const auto renamed = info.renames.find(text);
+    if (renamed != info.renames.end())
+      return sheet.GetStyle(renamed->second);
+  }
+  return sheet.FindStyle(name);
+}
+
+template void Style::ReadMembers<detail::TreeAccess>(const StyleSheet&, const Json::Object&,
+                                                     JsonValue&);
+template void Style::ReadMembers<detail::DocumentAccess>(const StyleSheet&,
+                                                         const Json::Document::Ref&, JsonValue&);
 
 Style* Style::Deserialize(const StyleSheet& sheet, const Json::Object& object,
                           const PropertyKey& category) {

@@ -16,6 +16,7 @@
 #include <map>
 #include <memory>
 #include <set>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -83,6 +84,7 @@ public:
   // Removes the entry of `key`; true when there was one.
   bool Erase(const PropertyKey& key);
   void Clear() noexcept { m_entries.clear(); }
+  void Reserve(std::size_t count) { m_entries.reserve(count); }
   void Swap(PropertyMap& other) noexcept { m_entries.swap(other.m_entries); }
 
 private:
@@ -343,6 +345,14 @@ private:
   void AppendValueDependencies(StyleSpan styles, bool parentOnly, std::vector<Style*>& out) const;
 
   friend class StyleSheet;
+  // Reads the members of a style's JSON object, held as Access describes it
+  // (a value tree or a compact document); `scratch` is reused for values.
+  template <class Access>
+  void ReadMembers(const StyleSheet& sheet, const typename Access::Object& object,
+                   JsonValue& scratch);
+  // The style that an "inherits" member names, after the import bookkeeping:
+  // null for a name it says to ignore, or a name the sheet lacks.
+  static Style* ResolveParent(const StyleSheet& sheet, std::u16string_view name);
   // Hands the members of the style's JSON object to `sink`, in their order.
   template <class Sink>
   void SerializeMembers(const StyleSheet& sheet, bool includeTemporary, Sink& sink) const;

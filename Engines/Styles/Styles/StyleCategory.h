@@ -10,6 +10,9 @@
 #include <ZelUtils/Any.h>
 
 #include <map>
+#include <string_view>
+#include <unordered_map>
+#include <utility>
 #include <vector>
 
 namespace ZelPref {
@@ -34,6 +37,9 @@ public:
   void RegisterProperty(const PropertyKey& key, BaseStyleProperty* property);
   // The behaviour registered under `key`, or null. Not owned by the caller.
   BaseStyleProperty* GetStyleProperty(const PropertyKey& key) const;
+  // The behaviour registered under the key whose text is `name`, or null:
+  // names read from documents are looked up without being pooled.
+  BaseStyleProperty* FindStyleProperty(std::u16string_view name) const;
   // The behaviour's default value, one stable object per key. Throws
   // std::exception when no behaviour is registered under `key`.
   const ZelUtils::Any& GetDefaultValue(const PropertyKey& key) const;
@@ -58,6 +64,9 @@ private:
   std::vector<PropertyKey> m_propertyOrder;
   std::map<PropertyKey, BaseStyleProperty*> m_properties;
   bool m_flag;
+  // The same behaviours for fast lookups: by key identity, and by key text.
+  std::vector<std::pair<PropertyKey, BaseStyleProperty*>> m_byKey;
+  std::unordered_map<std::u16string_view, BaseStyleProperty*> m_byName;
 };
 
 } // namespace Styles

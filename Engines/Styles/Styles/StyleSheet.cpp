@@ -3,6 +3,8 @@
 #include <Styles/StyleCategory.h>
 #include <Styles/StyleManager.h>
 
+#include <Styles/Internal/JsonAccess.h>
+
 #include <Json/Json.h>
 #include <ZelUtils/TextStream.h>
 
@@ -13,6 +15,7 @@
 #include <cstdint>
 #include <iterator>
 #include <memory>
+#include <optional>
 #include <typeinfo>
 #include <unordered_map>
 #include <utility>
@@ -27,10 +30,6 @@ constexpr char16_t k_strExternalID[] = u"id";
 
 // The byte encoding of documents in streams, the same both ways.
 constexpr ZelUtils::TextStream::Encoding kDocumentEncoding = ZelUtils::TextStream::UTF8;
-
-bool NameEquals(const ZelStringT<char16_t>& name, const char16_t* fixed) {
-  return name.Compare(fixed, 0) == 0;
-}
 
 // A document number truncated toward zero into an int; values beyond the
 // range of int are clamped so that no input makes the conversion undefined.
@@ -182,6 +181,109 @@ private:
   std::vector<const Style*> m_chain; // scratch of Load
 };
 
+// An open-addressing table of index entries keyed by what KeyOf reads from an
+// entry: linear probing in a power-of-two array, deletion by shifting back,
+// so a lookup touches one or two cache lines instead of a chain of nodes.
+template <class Entry, class KeyOf> class EntryTable {
+public:
+  using Key = decltype(KeyOf()(std::declval<const Entry&>()));
+
+  std::size_t Size() const noexcept { return m_count; }
+  Entry* Find(const Key& key, std::size_t hash) const {
+    if (m_slots.empty())
+      return nullptr;
+    for (std::size_t i = hash & Mask();; i = (i + 1) & Mask()) {
+      const Slot& slot = m_slots[i];
+      if (!slot.entry)
+        return nullptr;
+      if (slot.hash == hash && KeyOf()(*slot.entry) == key)
+        return slot.entry;
+    }
+  }
+  // Adds `entry`, whose key must not be in the table yet.
+  void Insert(Entry* entry, std::size_t hash) {
+    Reserve(m_count + 1);
+    std::size_t i = hash & Mask();
+    while (m_slots[i].entry)
+      i = (i + 1) & Mask();
+    m_slots[i] = Slot{hash, entry};
+    ++m_count;
+  }
+  void Erase(const Entry* entry, std::size_t hash) {
+    std::size_t i = hash & Mask();
+    while (m_slots[i].entry != entry)
+      i = (i + 1) & Mask();
+    // Shift back the entries that probed past the freed slot.
+    for (std::size_t j = (i + 1) & Mask(); m_slots[j].entry; j = (j + 1) & Mask()) {
+      const std::size_t home = m_slots[j].hash & Mask();
+      if (((j - home) & Mask()) >= ((j - i) & Mask())) {
+        m_slots[i] = m_slots[j];
+        i = j;
+      }
+    }
+    m_slots[i] = Slot{};
+    --m_count;
+  }
+  // Room for `count` entries at a load of at most three quarters.
+  void Reserve(std::size_t count) {
+    if (count * 4 <= m_slots.size() * 3)
+      return;
+    std::size_t capacity = 16;
+    while (capacity * 3 < count * 4)
+      capacity *= 2;
+    std::vector<Slot> slots(capacity);
+    slots.swap(m_slots);
+    for (const Slot& slot : slots) {
+      if (!slot.entry)
+        continue;
+      std::size_t i = slot.hash & Mask();
+      while (m_slots[i].entry)
+        i = (i + 1) & Mask();
+      m_slots[i] = slot;
+    }
+  }
+  void Clear() noexcept {
+    m_slots.clear();
+    m_count = 0;
+  }
+
+private:
+  struct Slot {
+    std::size_t hash = 0;
+    Entry* entry = nullptr;
+  };
+  std::size_t Mask() const noexcept { return m_slots.size() - 1; }
+
+  std::vector<Slot> m_slots;
+  std::size_t m_count = 0;
+};
+
+// Sorts a range whose ascending runs are already long, as the names of a
+// document usually are (each category lists its styles in name order), by
+// merging the runs; a range of many runs is sorted afresh.
+template <class Iterator, class Less> void SortRuns(Iterator first, Iterator last, Less less) {
+  constexpr std::size_t kMostRuns = 64;
+  std::vector<Iterator> bounds{first};
+  for (Iterator it = first; it != last && bounds.size() <= kMostRuns; ++it)
+    if (it + 1 != last && less(*(it + 1), *it))
+      bounds.push_back(it + 1);
+  if (bounds.size() > kMostRuns) {
+    std::sort(first, last, less);
+    return;
+  }
+  bounds.push_back(last);
+  while (bounds.size() > 2) {
+    std::vector<Iterator> merged{first};
+    for (std::size_t i = 0; i + 2 < bounds.size(); i += 2) {
+      std::inplace_merge(bounds[i], bounds[i + 1], bounds[i + 2], less);
+      merged.push_back(bounds[i + 2]);
+    }
+    if (bounds.size() % 2 == 0)
+      merged.push_back(last);
+    bounds.swap(merged);
+  }
+}
+
 // The sheet's styles by name and by pointer. A name is case-folded once, when
 // it is filed, and looked up by a hash of its folding, so finding a style
 // costs one folding of the asked name whatever the sheet's size. Name order
@@ -200,68 +302,66 @@ public:
   Entry* Find(std::u16string_view name) const {
     thread_local std::u16string folded;
     ZelPlatform::detail::FoldCaseUtf16(name, folded);
-    const auto found = m_byName.find(folded);
-    return found == m_byName.end() ? nullptr : found->second;
+    return m_byName.Find(folded, HashName(folded));
   }
   // The entry of `style`, also when its name was dropped; null for null.
   Entry* Find(const Style* style) const {
-    const auto found = m_byStyle.find(style);
-    return found == m_byStyle.end() ? nullptr : found->second;
+    return style ? m_byStyle.Find(style, HashStyle(style)) : nullptr;
   }
-  std::size_t Size() const noexcept { return m_byName.size(); }
+  std::size_t Size() const noexcept { return m_byName.Size(); }
   void Reserve(std::size_t count) {
-    m_byName.reserve(count);
-    m_byStyle.reserve(count);
+    m_byName.Reserve(count);
+    m_byStyle.Reserve(count);
   }
 
   // Files `style` under `name`, which no entry holds; `style` must not be in
   // the index. Both indexes are unchanged when this throws.
-  Entry* Add(const ZelStringT<char16_t>& name, Style* style) {
-    auto entry = std::make_unique<Entry>(Entry{name, std::u16string(), style});
-    ZelPlatform::detail::FoldCaseUtf16(name.GetView(), entry->folded);
+  Entry* Add(std::u16string_view name, Style* style) {
+    auto entry =
+        std::make_unique<Entry>(Entry{ZelStringT<char16_t>(name), std::u16string(), style});
+    ZelPlatform::detail::FoldCaseUtf16(name, entry->folded);
     MakeRoomForOne(m_entries);
     MakeRoomForOne(m_pending);
-    m_byName.emplace(entry->folded, entry.get());
-    if (style) {
-      try {
-        m_byStyle.emplace(style, entry.get());
-      } catch (...) {
-        m_byName.erase(entry->folded);
-        throw;
-      }
-    }
+    m_byName.Reserve(m_byName.Size() + 1);
+    m_byStyle.Reserve(m_byStyle.Size() + 1);
+    m_byName.Insert(entry.get(), HashName(entry->folded));
+    if (style)
+      m_byStyle.Insert(entry.get(), HashStyle(style));
     m_pending.push_back(entry.get());
     m_entries.push_back(std::move(entry));
     return m_entries.back().get();
   }
   // Files `style` in place of the entry's style, under `spelling`.
-  void Replace(Entry* entry, const ZelStringT<char16_t>& spelling, Style* style) {
-    ZelStringT<char16_t> name = spelling;
-    if (style)
-      m_byStyle.emplace(style, entry);
-    if (entry->style && entry->style != style)
-      m_byStyle.erase(entry->style);
+  void Replace(Entry* entry, std::u16string_view spelling, Style* style) {
+    ZelStringT<char16_t> name(spelling);
+    m_byStyle.Reserve(m_byStyle.Size() + 1);
+    if (entry->style != style) {
+      if (entry->style)
+        m_byStyle.Erase(entry, HashStyle(entry->style));
+      if (style)
+        m_byStyle.Insert(entry, HashStyle(style));
+    }
     entry->style = style;
     entry->name = std::move(name);
   }
   // Takes the entry out of both indexes; the memory goes later.
   void Erase(Entry* entry) {
     if (entry->listed)
-      m_byName.erase(entry->folded);
+      m_byName.Erase(entry, HashName(entry->folded));
     if (entry->style)
-      m_byStyle.erase(entry->style);
+      m_byStyle.Erase(entry, HashStyle(entry->style));
     entry->listed = false;
     entry->erased = true;
     // Erased entries are freed with the next ordering, or once they outnumber
     // the live ones.
-    if (++m_erased > m_byStyle.size() + 16)
+    if (++m_erased > m_byStyle.Size() + 16)
       Ordered();
   }
   // Drops every name; the styles stay known by pointer.
   void DropNames() {
     for (const auto& entry : m_entries)
       entry->listed = false;
-    m_byName.clear();
+    m_byName.Clear();
     m_stale = true;
   }
   // The listed entries in name order.
@@ -274,9 +374,9 @@ public:
     };
     m_ordered.erase(std::remove_if(m_ordered.begin(), m_ordered.end(), unlisted), m_ordered.end());
     m_pending.erase(std::remove_if(m_pending.begin(), m_pending.end(), unlisted), m_pending.end());
-    std::sort(m_pending.begin(), m_pending.end(), less);
     const std::size_t middle = m_ordered.size();
     m_ordered.insert(m_ordered.end(), m_pending.begin(), m_pending.end());
+    SortRuns(m_ordered.begin() + static_cast<std::ptrdiff_t>(middle), m_ordered.end(), less);
     std::inplace_merge(m_ordered.begin(), m_ordered.begin() + static_cast<std::ptrdiff_t>(middle),
                        m_ordered.end(), less);
     m_pending.clear();
@@ -299,21 +399,36 @@ public:
     for (const auto& entry : m_entries)
       if (!entry->listed && !entry->erased && entry->style)
         styles.push_back(entry->style);
-    m_byName.clear();
-    m_byStyle.clear();
+    m_byName.Clear();
+    m_byStyle.Clear();
     m_ordered.clear();
     m_entries.clear();
     return styles;
   }
 
 private:
+  struct FoldedOf {
+    std::u16string_view operator()(const Entry& entry) const { return entry.folded; }
+  };
+  struct StyleOf {
+    const Style* operator()(const Entry& entry) const { return entry.style; }
+  };
+  static std::size_t HashName(std::u16string_view folded) {
+    return std::hash<std::u16string_view>()(folded);
+  }
+  static std::size_t HashStyle(const Style* style) {
+    // Addresses are multiples of the allocation alignment; mix the bits.
+    return static_cast<std::size_t>((reinterpret_cast<std::uintptr_t>(style) >> 4) *
+                                    0x9E3779B97F4A7C15ull);
+  }
+
   mutable std::vector<std::unique_ptr<Entry>> m_entries; // owns every entry
   mutable std::vector<Entry*> m_ordered;                 // listed entries in name order
   mutable std::vector<Entry*> m_pending;                 // filed since the last ordering
   mutable bool m_stale = false;                          // names dropped since then
   mutable std::size_t m_erased = 0;
-  std::unordered_map<std::u16string_view, Entry*> m_byName;
-  std::unordered_map<const Style*, Entry*> m_byStyle;
+  EntryTable<Entry, FoldedOf> m_byName;
+  EntryTable<Entry, StyleOf> m_byStyle;
 };
 
 } // namespace detail
@@ -325,11 +440,10 @@ namespace {
 // filed under `name` and whether `style` went in; when it did not (a clash
 // without `replace`), `style` is still the caller's to destroy.
 std::pair<detail::StyleIndex::Entry*, bool> FileStyle(detail::StyleIndex& index,
-                                                      const ZelStringT<char16_t>& name,
-                                                      Style* style, bool replace,
-                                                      Style*& previous) {
+                                                      std::u16string_view name, Style* style,
+                                                      bool replace, Style*& previous) {
   previous = nullptr;
-  detail::StyleIndex::Entry* found = index.Find(name.GetView());
+  detail::StyleIndex::Entry* found = index.Find(name);
   if (found && !replace)
     return {found, false};
   try {
@@ -375,7 +489,7 @@ Style* StyleSheet::AddStyle(const ZelStringT<char16_t>& name, Style* style, bool
         // Already filed under this name: destroying or handing it back would
         // leave the sheet listing a style it no longer has.
         if (replace)
-          m_index->Replace(filedAs, name, style);
+          m_index->Replace(filedAs, name.GetView(), style);
         return nullptr;
       }
       // Filed under another name: it leaves that one, so that the sheet never
@@ -384,7 +498,7 @@ Style* StyleSheet::AddStyle(const ZelStringT<char16_t>& name, Style* style, bool
     }
   }
   Style* previous = nullptr;
-  const auto [entry, filed] = FileStyle(*m_index, name, style, replace, previous);
+  const auto [entry, filed] = FileStyle(*m_index, name.GetView(), style, replace, previous);
   if (!filed) {
     // The style already in the sheet wins; whatever referred to the offered
     // one follows the name.
@@ -473,11 +587,11 @@ void StyleSheet::RenameStyle(const ZelStringT<char16_t>& oldName,
   detail::StyleIndex::Entry* taken = m_index->Find(newName.GetView());
   if (taken == entry) {
     // Only the letter case changes: the name is re-spelled in place.
-    m_index->Replace(entry, newName, entry->style);
+    m_index->Replace(entry, newName.GetView(), entry->style);
   } else if (!taken) {
     Style* style = entry->style;
     m_index->Erase(entry);
-    m_index->Add(newName, style);
+    m_index->Add(newName.GetView(), style);
   }
 }
 
@@ -496,7 +610,11 @@ void StyleSheet::MergeIn(StyleSheet& other, bool replace) {
 }
 
 Style* StyleSheet::GetStyle(const ZelStringT<char16_t>& name) const {
-  const detail::StyleIndex::Entry* entry = m_index->Find(name.GetView());
+  return FindStyle(name.GetView());
+}
+
+Style* StyleSheet::FindStyle(std::u16string_view name) const {
+  const detail::StyleIndex::Entry* entry = m_index->Find(name);
   return entry ? entry->style : nullptr;
 }
 
@@ -673,13 +791,29 @@ bool StyleSheet::ImportJson(Json::Object* document, bool replace) {
   assert(document && "ImportJson needs a document");
   if (!document)
     return false;
+  ImportMembers<detail::TreeAccess>(*document, replace);
+  return true;
+}
+
+namespace {
+
+// Whether a category is registered under `name`, without pooling the name.
+bool IsCategory(const StyleManager& manager, std::u16string_view name) {
+  const std::optional<PropertyKey> key = PropertyKey::Find(name);
+  return key && manager.FindCategory(*key);
+}
+
+} // namespace
+
+template <class Access>
+void StyleSheet::ImportMembers(const typename Access::Object& document, bool replace) {
   StyleManager& manager = GetStyleManager();
   // Styles made by this import, sorted after the first pass; only they are
   // read, so styles that were in the sheet before are never read into.
   std::vector<const Style*> created;
-  // The name-index entry filed under each style member's name, in document
-  // order. Import never erases an entry (a replacement re-files it), so the
-  // second pass reads each entry instead of searching for the name again.
+  // The index entry filed under each style member's name, in document order.
+  // Import never erases an entry (a replacement re-files it), so the second
+  // pass reads each entry instead of searching for the name again.
   std::vector<const detail::StyleIndex::Entry*> filed;
   // Styles that replacements took out of the sheet, with the entry of the
   // name each held. They are destroyed after the first pass, once every style
@@ -699,33 +833,38 @@ bool StyleSheet::ImportJson(Json::Object* document, bool replace) {
   // The members are gone through twice. The first pass makes an empty style
   // for every name, so that every reference resolves when the second pass
   // reads the styles; the version and the ID are applied in both.
-  const std::size_t memberCount = document->GetSize();
-  const auto applySheetMember = [&](const ZelStringT<char16_t>& name, const Json::Value& value) {
-    if (const double* number = value.GetIf<double>()) {
-      if (NameEquals(name, k_strVersion)) {
+  const std::size_t memberCount = Access::Size(document);
+  const auto applySheetMember = [&](std::u16string_view name, typename Access::Value value) {
+    if (const std::optional<double> number = Access::AsNumber(value)) {
+      if (name == k_strVersion) {
         m_version = TruncateVersion(*number);
         versionSeen = true;
       }
-    } else if (const ZelStringT<char16_t>* text = value.GetIf<ZelStringT<char16_t>>()) {
+    } else if (const std::optional<std::u16string_view> text = Access::AsString(value)) {
       // The document's ID is taken only by a sheet that already has one.
-      if (NameEquals(name, k_strExternalID) && !m_externalID.IsEmpty())
-        m_externalID = *text;
+      if (name == k_strExternalID && !m_externalID.IsEmpty())
+        m_externalID = ZelStringT<char16_t>(*text);
     }
   };
 
   try {
+    std::size_t styleCount = m_index->Size();
+    for (std::size_t i = 0; i < memberCount; ++i)
+      if (const auto category = Access::AsObject(Access::Member(document, i)))
+        styleCount += Access::Size(*category);
+    m_index->Reserve(styleCount);
     for (std::size_t i = 0; i < memberCount; ++i) {
-      const ZelStringT<char16_t>& name = document->GetValueName(i);
-      const Json::Value& value = document->GetValue(i);
-      const Json::Object* category = value.GetIf<Json::Object>();
+      const std::u16string_view name = Access::Name(document, i);
+      const typename Access::Value value = Access::Member(document, i);
+      const auto category = Access::AsObject(value);
       if (!category) {
         applySheetMember(name, value);
         continue;
       }
-      if (!manager.CategoryExists(name))
+      if (!IsCategory(manager, name))
         continue;
-      for (std::size_t j = 0; j < category->GetSize(); ++j) {
-        category->GetValue(j).Get<Json::Object>(); // std::bad_cast for a non-object
+      for (std::size_t j = 0; j < Access::Size(*category); ++j) {
+        Access::RequireObject(Access::Member(*category, j)); // std::bad_cast for a non-object
         // Room first, so that nothing below can throw once a style is out.
         MakeRoomForOne(created);
         MakeRoomForOne(filed);
@@ -735,7 +874,7 @@ bool StyleSheet::ImportJson(Json::Object* document, bool replace) {
         Style* previous = nullptr;
         // FileStyle owns `style`, also when it throws.
         const auto [entry, isFiled] =
-            FileStyle(*m_index, category->GetValueName(j), style, replace, previous);
+            FileStyle(*m_index, Access::Name(*category, j), style, replace, previous);
         if (!isFiled)
           delete style;
         if (previous)
@@ -753,24 +892,26 @@ bool StyleSheet::ImportJson(Json::Object* document, bool replace) {
   std::sort(created.begin(), created.end());
 
   const ImportScope scope(m_import);
+  JsonValue scratch;
   std::size_t next = 0;
   for (std::size_t i = 0; i < memberCount; ++i) {
-    const ZelStringT<char16_t>& name = document->GetValueName(i);
-    const Json::Value& value = document->GetValue(i);
-    const Json::Object* category = value.GetIf<Json::Object>();
+    const std::u16string_view name = Access::Name(document, i);
+    const typename Access::Value value = Access::Member(document, i);
+    const auto category = Access::AsObject(value);
     if (!category) {
       applySheetMember(name, value);
       continue;
     }
-    if (!manager.CategoryExists(name))
+    const std::optional<PropertyKey> categoryKey = PropertyKey::Find(name);
+    if (!categoryKey || !manager.FindCategory(*categoryKey))
       continue;
-    const PropertyKey categoryKey(name);
-    for (std::size_t j = 0; j < category->GetSize(); ++j) {
+    for (std::size_t j = 0; j < Access::Size(*category); ++j) {
       Style* style = filed[next++]->style;
       if (!std::binary_search(created.begin(), created.end(), style))
         continue;
-      style->SetCategory(categoryKey);
-      style->DeserializeJson(*this, category->GetValue(j).Get<Json::Object>());
+      style->SetCategory(*categoryKey);
+      style->ReadMembers<Access>(*this, Access::RequireObject(Access::Member(*category, j)),
+                                 scratch);
       if (!m_externalID.IsEmpty())
         style->SetExternalID(m_externalID);
     }
@@ -778,22 +919,36 @@ bool StyleSheet::ImportJson(Json::Object* document, bool replace) {
 
   if (!versionSeen)
     m_version = 0;
-  return true;
 }
 
 bool StyleSheet::ImportFromString(const ZelStringT<char16_t>& text, bool replace) {
-  Json::Value value;
+  if (typeid(*this) != typeid(StyleSheet)) {
+    // A derived sheet may read documents its own way: go through ImportJson.
+    Json::Value value;
+    ZelStringT<char16_t> errorText;
+    try {
+      if (!Json::Parse(text, value, errorText))
+        return false;
+    } catch (...) {
+      return false;
+    }
+    Json::Object* document = value.GetIf<Json::Object>();
+    return document && ImportJson(document, replace);
+  }
+  // The same import as ImportJson's, read from a compact parse of the text.
+  Json::Document document;
   ZelStringT<char16_t> errorText;
   try {
-    if (!Json::Parse(text, value, errorText))
+    if (!document.Parse(text, errorText))
       return false;
   } catch (...) {
     return false;
   }
-  Json::Object* document = value.GetIf<Json::Object>();
-  if (!document)
+  const Json::Document::Ref root = document.GetRoot();
+  if (!root.IsObject())
     return false;
-  return ImportJson(document, replace);
+  ImportMembers<detail::DocumentAccess>(root, replace);
+  return true;
 }
 
 void StyleSheet::ExportToString(ZelStringT<char16_t>& text, bool includeTemporary) const {
@@ -805,7 +960,14 @@ void StyleSheet::ExportToString(ZelStringT<char16_t>& text, bool includeTemporar
     return;
   }
   // The same text as ExportJson's tree would give, written without the tree.
+  const auto categories = GroupByCategory(*m_index);
+  // A generous guess of the text's length saves the text's growth steps.
+  std::size_t estimate = 64;
+  for (const auto& group : categories)
+    for (const detail::StyleIndex::Entry* entry : group.second)
+      estimate += entry->name.GetLength() + 32 + 48 * entry->style->GetProperties().size();
   Json::Writer writer(false);
+  writer.Reserve(estimate);
   writer.StartObject();
   if (m_version > 0) {
     writer.Key(k_strVersion);
@@ -816,7 +978,7 @@ void StyleSheet::ExportToString(ZelStringT<char16_t>& text, bool includeTemporar
     writer.String(m_externalID.GetView());
   }
   JsonValue scratch;
-  for (const auto& [category, entries] : GroupByCategory(*m_index)) {
+  for (const auto& [category, entries] : categories) {
     writer.Key(category.GetView());
     writer.StartObject();
     for (const detail::StyleIndex::Entry* entry : entries) {

@@ -178,6 +178,11 @@ private:
   // an heir is or inherits from, or every one when an heir is null, takes
   // over the old style's values instead.
   void Redirect(const std::map<Style*, Style*>& heirs);
+  // Imports the members of a document held as Access describes it (a value
+  // tree or a compact document): ImportJson's work for either.
+  template <class Access> void ImportMembers(const typename Access::Object& document, bool replace);
+  // The style filed under `name` in any letter case, or null.
+  Style* FindStyle(std::u16string_view name) const;
   // The name `style` is filed under, not copied; null when it is not filed.
   const ZelStringT<char16_t>* FindStyleName(const Style* style) const;
   // Whether `child` may inherit from `parent`: false when `child` is `parent`

@@ -60,6 +60,14 @@ TEST(ZelStringTest, CompareNoCaseFoldsFullUnicode) {
     EXPECT_EQ(replaced.CompareNoCase(lone), 0);
   }
   EXPECT_LT(replaced.CompareNoCase(u"a\U00010000"), 0);
+  // At every position of a text, which the search for surrogates scans in
+  // steps of four.
+  for (std::size_t at = 0; at < 9; ++at) {
+    std::u16string withLone(9, u'x'), withReplacement(9, u'x');
+    withLone[at] = at % 2 ? low : high;
+    withReplacement[at] = 0xFFFD;
+    EXPECT_EQ(String16(withLone).CompareNoCase(withReplacement), 0) << at;
+  }
   // UTF-8 folds the same way; ill-formed bytes compare consistently.
   EXPECT_EQ(ZelStringT<char>("\xE2\x84\xAA").CompareNoCase("k"), 0);
   EXPECT_EQ(ZelStringT<char>("\xC3").CompareNoCase("\xC3"), 0);

@@ -2,6 +2,10 @@
 
 #include <gtest/gtest.h>
 
+#include <random>
+
+#include <charconv>
+
 #include <cmath>
 #include <limits>
 #include <string>
@@ -34,6 +38,26 @@ TEST(ConversionPolicyTest, NumberRoundTripsShortestText) {
     EXPECT_EQ(policy.FromText(policy.ToText(Any(value))).Get<double>(), value);
   }
   EXPECT_TRUE(std::signbit(policy.FromText(policy.ToText(Any(-0.0))).Get<double>()));
+  // The text is std::to_chars' own, also where a short decimal takes a fast
+  // path: whole numbers and decimals of every length around it, both forms.
+  std::mt19937_64 random(5);
+  std::vector<double> values = {0.0,      -0.0,  1e5,   1e6,  123000,           0.001,
+                                0.0001,   0.125, 100.5, 1e14, 999999999999.999, -12.75,
+                                0.1 + 0.2};
+  for (int i = 0; i < 20000; ++i) {
+    const double whole = static_cast<double>(random() % 2000000) - 1000000;
+    const double scale = std::pow(10.0, static_cast<double>(random() % 9));
+    values.push_back(whole / scale);
+    values.push_back(std::nextafter(whole / 1000, 1e300));
+  }
+  for (const double value : values) {
+    char expected[64];
+    const char* end = std::to_chars(expected, expected + sizeof expected, value).ptr;
+    const ZelStringT<char16_t> text = policy.ToText(Any(value));
+    ASSERT_EQ(std::string(text.GetView().begin(), text.GetView().end()),
+              std::string(static_cast<const char*>(expected), end))
+        << value;
+  }
 }
 
 // Each policy reads the texts on the left and refuses those on the right.
