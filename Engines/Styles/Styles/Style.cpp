@@ -1021,8 +1021,8 @@ namespace {
 class TreeSink {
 public:
   explicit TreeSink(Json::Object& object) : m_object(object) {}
-  void Text(const ZelStringT<char16_t>& name, const ZelStringT<char16_t>& text) {
-    m_object.AddValue(name, Json::Value(text));
+  void Text(const ZelStringT<char16_t>& name, std::u16string_view text) {
+    m_object.AddValue(name, Json::Value(ZelStringT<char16_t>(text)));
   }
   Json::Value& Value() { return m_value = Json::Value(); }
   void Member(const ZelStringT<char16_t>& name) { m_object.AddValue(name, std::move(m_value)); }
@@ -1036,9 +1036,9 @@ private:
 class WriterSink {
 public:
   WriterSink(Json::Writer& writer, Json::Value& scratch) : m_writer(writer), m_value(scratch) {}
-  void Text(const ZelStringT<char16_t>& name, const ZelStringT<char16_t>& text) {
+  void Text(const ZelStringT<char16_t>& name, std::u16string_view text) {
     m_writer.Key(name.GetView());
-    m_writer.String(text.GetView());
+    m_writer.String(text);
   }
   Json::Value& Value() { return m_value; }
   void Member(const ZelStringT<char16_t>& name) {
@@ -1055,13 +1055,13 @@ private:
 
 template <class Sink>
 void Style::SerializeMembers(const StyleSheet& sheet, bool includeTemporary, Sink& sink) const {
-  if (const ZelStringT<char16_t>* parentName = sheet.FindStyleName(m_parent))
-    if (!parentName->IsEmpty())
-      sink.Text(k_strPropertyInherits, *parentName);
+  const std::u16string_view parentName = sheet.FindStyleName(m_parent);
+  if (!parentName.empty())
+    sink.Text(k_strPropertyInherits, parentName);
   if (!m_externalID.IsEmpty())
-    sink.Text(k_strExternalID, m_externalID);
+    sink.Text(k_strExternalID, m_externalID.GetView());
   if (!m_externalName.IsEmpty())
-    sink.Text(k_strExternalName, m_externalName);
+    sink.Text(k_strExternalName, m_externalName.GetView());
   for (const PropertyMap::Entry& entry : m_properties) {
     const BaseStyleProperty* behaviour = FindBehaviour(entry.first);
     if (!behaviour || (!includeTemporary && behaviour->IsTemporary()))
@@ -1112,7 +1112,14 @@ void Style::ReadMembers(const StyleSheet& sheet, const typename Access::Object& 
   std::vector<std::pair<const BaseStyleProperty*, typename Access::Value>> deprecated;
   std::vector<const BaseStyleProperty*> needAdjustment;
   const std::size_t count = Access::Size(object);
-  m_properties.Reserve(m_properties.size() + count);
+  // Room for the members that can be properties, in one step.
+  std::size_t fixedMembers = 0;
+  for (std::size_t i = 0; i < count; ++i) {
+    const std::u16string_view name = Access::Name(object, i);
+    fixedMembers += name == k_strPropertyInherits.GetView() || name == k_strExternalID.GetView() ||
+                    name == k_strExternalName.GetView();
+  }
+  m_properties.Reserve(m_properties.size() + count - fixedMembers);
   for (std::size_t i = 0; i < count; ++i) {
     const std::u16string_view name = Access::Name(object, i);
     const typename Access::Value value = Access::Member(object, i);

@@ -13,6 +13,7 @@
 #include <climits>
 #include <cmath>
 #include <cstdint>
+#include <deque>
 #include <iterator>
 #include <memory>
 #include <optional>
@@ -290,12 +291,19 @@ template <class Iterator, class Less> void SortRuns(Iterator first, Iterator las
 // is a sorted list that new names join when the order is next asked for.
 class StyleIndex {
 public:
+  // One filed style. Its name as spelled and the name's folding share one
+  // block; a name that is its own folding is kept once.
   struct Entry {
-    ZelStringT<char16_t> name; // as spelled when filed or last re-spelled
-    std::u16string folded;     // never changes while the entry is filed
-    Style* style;
+    Style* style = nullptr;
+    std::unique_ptr<char16_t[]> text;
+    std::uint32_t nameLength = 0;
+    std::uint32_t foldedStart = 0;
+    std::uint32_t foldedLength = 0;
     bool listed = true; // in the name index (and so in name order)
     bool erased = false;
+
+    std::u16string_view Name() const noexcept { return {text.get(), nameLength}; }
+    std::u16string_view Folded() const noexcept { return {text.get() + foldedStart, foldedLength}; }
   };
 
   // The entry filed under `name` in any letter case, or null.
@@ -317,23 +325,39 @@ public:
   // Files `style` under `name`, which no entry holds; `style` must not be in
   // the index. Both indexes are unchanged when this throws.
   Entry* Add(std::u16string_view name, Style* style) {
-    auto entry =
-        std::make_unique<Entry>(Entry{ZelStringT<char16_t>(name), std::u16string(), style});
-    ZelPlatform::detail::FoldCaseUtf16(name, entry->folded);
-    MakeRoomForOne(m_entries);
+    thread_local std::u16string folded;
+    ZelPlatform::detail::FoldCaseUtf16(name, folded);
+    std::unique_ptr<char16_t[]> text = Spell(name, folded);
+    MakeRoomForOne(m_ordered);
     MakeRoomForOne(m_pending);
     m_byName.Reserve(m_byName.Size() + 1);
     m_byStyle.Reserve(m_byStyle.Size() + 1);
-    m_byName.Insert(entry.get(), HashName(entry->folded));
+    if (m_free.empty())
+      m_entries.emplace_back();
+    // Nothing below throws.
+    Entry* entry = &m_entries.back();
+    if (!m_free.empty()) {
+      entry = m_free.back();
+      m_free.pop_back();
+    }
+    *entry = Entry();
+    entry->style = style;
+    entry->text = std::move(text);
+    entry->nameLength = static_cast<std::uint32_t>(name.size());
+    entry->foldedStart = folded == name ? 0 : entry->nameLength;
+    entry->foldedLength = static_cast<std::uint32_t>(folded.size());
+    m_byName.Insert(entry, HashName(entry->Folded()));
     if (style)
-      m_byStyle.Insert(entry.get(), HashStyle(style));
-    m_pending.push_back(entry.get());
-    m_entries.push_back(std::move(entry));
-    return m_entries.back().get();
+      m_byStyle.Insert(entry, HashStyle(style));
+    m_pending.push_back(entry);
+    return entry;
   }
-  // Files `style` in place of the entry's style, under `spelling`.
+  // Files `style` in place of the entry's style, under `spelling`, which
+  // folds as the entry's name does.
   void Replace(Entry* entry, std::u16string_view spelling, Style* style) {
-    ZelStringT<char16_t> name(spelling);
+    // The new block holds the folding apart exactly when it differs.
+    const bool foldedApart = entry->Folded() != spelling;
+    std::unique_ptr<char16_t[]> text = Spell(spelling, entry->Folded());
     m_byStyle.Reserve(m_byStyle.Size() + 1);
     if (entry->style != style) {
       if (entry->style)
@@ -342,25 +366,27 @@ public:
         m_byStyle.Insert(entry, HashStyle(style));
     }
     entry->style = style;
-    entry->name = std::move(name);
+    entry->text = std::move(text);
+    entry->nameLength = static_cast<std::uint32_t>(spelling.size());
+    entry->foldedStart = foldedApart ? entry->nameLength : 0;
   }
-  // Takes the entry out of both indexes; the memory goes later.
+  // Takes the entry out of both indexes; its slot is reused later.
   void Erase(Entry* entry) {
     if (entry->listed)
-      m_byName.Erase(entry, HashName(entry->folded));
+      m_byName.Erase(entry, HashName(entry->Folded()));
     if (entry->style)
       m_byStyle.Erase(entry, HashStyle(entry->style));
     entry->listed = false;
     entry->erased = true;
-    // Erased entries are freed with the next ordering, or once they outnumber
-    // the live ones.
+    // Erased entries are recycled after the next ordering drops them, or once
+    // they outnumber the live ones.
     if (++m_erased > m_byStyle.Size() + 16)
       Ordered();
   }
   // Drops every name; the styles stay known by pointer.
   void DropNames() {
-    for (const auto& entry : m_entries)
-      entry->listed = false;
+    for (Entry& entry : m_entries)
+      entry.listed = false;
     m_byName.Clear();
     m_stale = true;
   }
@@ -370,7 +396,7 @@ public:
       return m_ordered;
     const auto unlisted = [](const Entry* entry) { return !entry->listed; };
     const auto less = [](const Entry* a, const Entry* b) {
-      return ZelPlatform::detail::CompareCodePointOrder(a->folded, b->folded) < 0;
+      return ZelPlatform::detail::CompareCodePointOrder(a->Folded(), b->Folded()) < 0;
     };
     m_ordered.erase(std::remove_if(m_ordered.begin(), m_ordered.end(), unlisted), m_ordered.end());
     m_pending.erase(std::remove_if(m_pending.begin(), m_pending.end(), unlisted), m_pending.end());
@@ -382,9 +408,12 @@ public:
     m_pending.clear();
     m_stale = false;
     if (m_erased) {
-      m_entries.erase(std::remove_if(m_entries.begin(), m_entries.end(),
-                                     [](const auto& entry) { return entry->erased; }),
-                      m_entries.end());
+      for (Entry& entry : m_entries) {
+        if (entry.erased && entry.text) {
+          entry.text.reset();
+          m_free.push_back(&entry);
+        }
+      }
       m_erased = 0;
     }
     return m_ordered;
@@ -396,20 +425,30 @@ public:
     styles.reserve(m_entries.size());
     for (const Entry* entry : Ordered())
       styles.push_back(entry->style);
-    for (const auto& entry : m_entries)
-      if (!entry->listed && !entry->erased && entry->style)
-        styles.push_back(entry->style);
+    for (const Entry& entry : m_entries)
+      if (!entry.listed && !entry.erased && entry.style)
+        styles.push_back(entry.style);
     m_byName.Clear();
     m_byStyle.Clear();
     m_ordered.clear();
+    m_free.clear();
     m_entries.clear();
     return styles;
   }
 
 private:
   struct FoldedOf {
-    std::u16string_view operator()(const Entry& entry) const { return entry.folded; }
+    std::u16string_view operator()(const Entry& entry) const { return entry.Folded(); }
   };
+  // One block holding `name`, then `folded` unless it equals the name.
+  static std::unique_ptr<char16_t[]> Spell(std::u16string_view name, std::u16string_view folded) {
+    const std::size_t length = name.size() + (folded == name ? 0 : folded.size());
+    std::unique_ptr<char16_t[]> text(new char16_t[length ? length : 1]);
+    std::copy(name.begin(), name.end(), text.get());
+    if (folded != name)
+      std::copy(folded.begin(), folded.end(), text.get() + name.size());
+    return text;
+  }
   struct StyleOf {
     const Style* operator()(const Entry& entry) const { return entry.style; }
   };
@@ -422,10 +461,11 @@ private:
                                     0x9E3779B97F4A7C15ull);
   }
 
-  mutable std::vector<std::unique_ptr<Entry>> m_entries; // owns every entry
-  mutable std::vector<Entry*> m_ordered;                 // listed entries in name order
-  mutable std::vector<Entry*> m_pending;                 // filed since the last ordering
-  mutable bool m_stale = false;                          // names dropped since then
+  mutable std::deque<Entry> m_entries;   // every entry; a deque never moves them
+  mutable std::vector<Entry*> m_free;    // erased entries ready for reuse
+  mutable std::vector<Entry*> m_ordered; // listed entries in name order
+  mutable std::vector<Entry*> m_pending; // filed since the last ordering
+  mutable bool m_stale = false;          // names dropped since then
   mutable std::size_t m_erased = 0;
   EntryTable<Entry, FoldedOf> m_byName;
   EntryTable<Entry, StyleOf> m_byStyle;
@@ -603,7 +643,7 @@ void StyleSheet::MergeIn(StyleSheet& other, bool replace) {
   std::vector<std::pair<ZelStringT<char16_t>, Style*>> own;
   own.reserve(m_index->Size());
   for (const detail::StyleIndex::Entry* entry : m_index->Ordered())
-    own.emplace_back(entry->name, entry->style);
+    own.emplace_back(ZelStringT<char16_t>(entry->Name()), entry->style);
   for (const auto& entry : own)
     delete AddStyle(entry.first, entry.second, replace);
   other.m_index->DropNames();
@@ -646,13 +686,12 @@ std::vector<Style*> StyleSheet::GetStylesByCategory(const PropertyKey& category)
 }
 
 ZelStringT<char16_t> StyleSheet::GetStyleName(const Style* style) const {
-  const ZelStringT<char16_t>* name = FindStyleName(style);
-  return name ? *name : ZelStringT<char16_t>();
+  return ZelStringT<char16_t>(FindStyleName(style));
 }
 
-const ZelStringT<char16_t>* StyleSheet::FindStyleName(const Style* style) const {
+std::u16string_view StyleSheet::FindStyleName(const Style* style) const {
   const detail::StyleIndex::Entry* entry = style ? m_index->Find(style) : nullptr;
-  return entry ? &entry->name : nullptr;
+  return entry ? entry->Name() : std::u16string_view();
 }
 
 std::vector<ZelStringT<char16_t>> StyleSheet::GetStyleNames() const {
@@ -660,7 +699,7 @@ std::vector<ZelStringT<char16_t>> StyleSheet::GetStyleNames() const {
   std::vector<ZelStringT<char16_t>> names;
   names.reserve(ordered.size());
   for (const detail::StyleIndex::Entry* entry : ordered)
-    names.push_back(entry->name);
+    names.emplace_back(entry->Name());
   return names;
 }
 
@@ -668,7 +707,7 @@ std::vector<ZelStringT<char16_t>> StyleSheet::GetStyleNames(const PropertyKey& c
   std::vector<ZelStringT<char16_t>> names;
   for (const detail::StyleIndex::Entry* entry : m_index->Ordered())
     if (entry->style && entry->style->GetCategoryName() == category)
-      names.push_back(entry->name);
+      names.emplace_back(entry->Name());
   return names;
 }
 
@@ -678,7 +717,7 @@ StyleSheet::NameIndex StyleSheet::GetChildStyles(const Style* parent) const {
     return children;
   for (const detail::StyleIndex::Entry* entry : m_index->Ordered())
     if (entry->style && entry->style->GetParent() == parent)
-      children.emplace_hint(children.end(), entry->name, entry->style);
+      children.emplace_hint(children.end(), ZelStringT<char16_t>(entry->Name()), entry->style);
   return children;
 }
 
@@ -688,7 +727,7 @@ void StyleSheet::GenerateCategoryStyleMap(CategoryStyleMap& out) const {
     if (!entry->style)
       continue;
     NameIndex& styles = out[entry->style->GetCategoryName()];
-    styles.emplace_hint(styles.end(), entry->name, entry->style);
+    styles.emplace_hint(styles.end(), ZelStringT<char16_t>(entry->Name()), entry->style);
   }
 }
 
@@ -761,7 +800,7 @@ void StyleSheet::ExportJson(JsonValue& out, bool includeTemporary) const {
     for (const detail::StyleIndex::Entry* entry : entries) {
       Json::Value json;
       entry->style->Serialize(*this, json, includeTemporary);
-      styles.AddValue(entry->name, std::move(json));
+      styles.AddValue(ZelStringT<char16_t>(entry->Name()), std::move(json));
     }
     document.AddValue(category.GetString(), Json::Value(std::move(styles)));
   }
@@ -965,7 +1004,7 @@ void StyleSheet::ExportToString(ZelStringT<char16_t>& text, bool includeTemporar
   std::size_t estimate = 64;
   for (const auto& group : categories)
     for (const detail::StyleIndex::Entry* entry : group.second)
-      estimate += entry->name.GetLength() + 32 + 48 * entry->style->GetProperties().size();
+      estimate += entry->nameLength + 32 + 48 * entry->style->GetProperties().size();
   Json::Writer writer(false);
   writer.Reserve(estimate);
   writer.StartObject();
@@ -982,7 +1021,7 @@ void StyleSheet::ExportToString(ZelStringT<char16_t>& text, bool includeTemporar
     writer.Key(category.GetView());
     writer.StartObject();
     for (const detail::StyleIndex::Entry* entry : entries) {
-      writer.Key(entry->name.GetView());
+      writer.Key(entry->Name());
       entry->style->WriteJson(*this, writer, includeTemporary, scratch);
     }
     writer.EndObject();

@@ -13,6 +13,7 @@
 
 #include <map>
 #include <memory>
+#include <string_view>
 #include <vector>
 
 namespace Styles {
@@ -183,8 +184,8 @@ private:
   template <class Access> void ImportMembers(const typename Access::Object& document, bool replace);
   // The style filed under `name` in any letter case, or null.
   Style* FindStyle(std::u16string_view name) const;
-  // The name `style` is filed under, not copied; null when it is not filed.
-  const ZelStringT<char16_t>* FindStyleName(const Style* style) const;
+  // The name `style` is filed under, not copied; empty when it is not filed.
+  std::u16string_view FindStyleName(const Style* style) const;
   // Whether `child` may inherit from `parent`: false when `child` is `parent`
   // or one of its ancestors. During an import the answer takes amortised
   // logarithmic time and the new link is recorded.
