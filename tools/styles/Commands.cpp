@@ -65,6 +65,30 @@ int LoadSheet(const std::string& path, StyleSheet& sheet,
   return kSuccess;
 }
 
+// Reads from `path` only what the style `name` depends on, all or nothing:
+// a large document answers for one style at the cost of that style alone.
+int LoadStyle(const std::string& path, const std::string& name, StyleSheet& sheet) {
+  Text text;
+  if (!ReadText(path, text)) {
+    Output::Error(DisplayName(path), "cannot be read");
+    return kUnreadable;
+  }
+  Json::Value value;
+  Text parseError;
+  if (!Json::Parse(text, value, parseError) || !value.Is<Json::Object>()) {
+    // The full check says where the text goes wrong.
+    Output::DocumentErrors(DisplayName(path), Styles::Tools::ValidateDocument(text));
+    return kUnusable;
+  }
+  Json::Object part = Styles::Tools::SelectStyles(value.Get<Json::Object>(), {FromUtf8(name)});
+  std::vector<Diagnostic> diagnostics;
+  if (!Styles::Tools::ImportChecked(sheet, part, true, &diagnostics)) {
+    Output::DocumentErrors(DisplayName(path), diagnostics);
+    return kUnusable;
+  }
+  return kSuccess;
+}
+
 const Style* FindStyle(const StyleSheet& sheet, const std::string& document,
                        const std::string& name) {
   const Style* style = sheet.GetStyle(FromUtf8(name));
@@ -167,7 +191,7 @@ int List(const CommonOptions& options, const std::string& document) {
 int Show(const CommonOptions& options, const std::string& document, const std::string& name,
          bool explain) {
   StyleSheet sheet;
-  if (const int status = LoadSheet(document, sheet))
+  if (const int status = LoadStyle(document, name, sheet))
     return status;
   const Style* style = FindStyle(sheet, document, name);
   if (!style)
@@ -178,7 +202,7 @@ int Show(const CommonOptions& options, const std::string& document, const std::s
 
 int Flatten(const CommonOptions&, const std::string& document, const std::string& name) {
   StyleSheet sheet;
-  if (const int status = LoadSheet(document, sheet))
+  if (const int status = LoadStyle(document, name, sheet))
     return status;
   const Style* style = FindStyle(sheet, document, name);
   if (!style)

@@ -93,6 +93,27 @@ bool ParseErrorOffset(const Text& message, std::size_t& offset) {
   return true;
 }
 
+// A JSON Pointer that is spelt out only when a diagnostic needs it: each
+// level holds its token and the level above, on the stack of the walk.
+struct Where {
+  const Where* up;
+  const Text* name;      // the member's name, or null for an array index
+  std::size_t index = 0;
+
+  Text Spell() const {
+    std::vector<const Where*> levels;
+    for (const Where* level = this; level; level = level->up)
+      levels.push_back(level);
+    Text pointer;
+    for (auto level = levels.rbegin(); level != levels.rend(); ++level)
+      pointer = (*level)->name ? AppendPointer(pointer, (*level)->name->GetView())
+                               : AppendPointer(pointer, (*level)->index);
+    return pointer;
+  }
+};
+
+const Text kInheritsName(kInherits);
+
 class Validator {
 public:
   Validator(const StyleSheet* target, bool replace)
@@ -102,111 +123,121 @@ public:
     CollectStyles(document);
     const int current = m_manager.GetCurrentVersion();
     if (m_versionSeen && current >= 0 && m_documentVersion > current)
-      Add(Severity::Warning, "version-too-new", m_versionPointer,
+      Add(Severity::Warning, "version-too-new", u"/version",
           u"the document's version " + Widen(std::to_string(m_documentVersion)) +
               u" is newer than the current version " + Widen(std::to_string(current)));
-    for (const DocumentStyle& style : m_styles)
-      CheckStyle(*style.object, style.category, style.pointer, style.node);
+    for (m_current = 0; m_current < m_styles.size(); ++m_current) {
+      const DocumentStyle& style = m_styles[m_current];
+      const Where category{nullptr, style.categoryName};
+      const Where where{&category, style.name};
+      CheckStyle(*style.object, style.category, where, style.node);
+    }
     FindCycles();
     return std::move(m_diagnostics);
   }
 
 private:
   struct DocumentStyle {
-    Text name;
+    const Text* categoryName;
+    const Text* name;
     PropertyKey category;
-    Text pointer;
     const Json::Object* object;
     std::size_t node;
   };
   // A style an "inherits" can name: one of the document (first member of
-  // that name) or of the target. Its parent edge is resolved on demand.
+  // that name) or of the target. A target style's parent edge is resolved on
+  // demand.
   struct Node {
     PropertyKey category;
     const Style* targetStyle = nullptr;
     std::size_t parent = kNone;
     bool parentKnown = false;
-    Text edgePointer; // the "inherits" member that made the edge
+    std::size_t edgeStyle = kNone; // the document style whose "inherits" made the edge
   };
+  // Case-insensitive names of the document, viewing the parsed text.
+  using NameMap =
+      std::map<std::u16string_view, std::size_t, ZelUtils::String::LessThanCaseInsensitive>;
 
   void Add(Severity severity, const char* code, const Text& pointer, const Text& message) {
     m_diagnostics.push_back(Diagnostic{severity, code, pointer, message, 0, 0});
+  }
+  void Add(Severity severity, const char* code, const Where& where, const Text& message) {
+    Add(severity, code, where.Spell(), message);
   }
 
   void CollectStyles(const Json::Object& document) {
     for (std::size_t i = 0; i < document.GetSize(); ++i) {
       const Text& name = document.GetValueName(i);
       const Json::Value& value = document.GetValue(i);
-      const Text pointer = AppendPointer(Text(), name);
+      const Where where{nullptr, &name};
       const Json::Object* category = value.GetIf<Json::Object>();
       if (!category) {
-        CheckSheetMember(name, value, pointer);
+        CheckSheetMember(name, value, where);
         continue;
       }
       if (!m_manager.CategoryExists(name)) {
-        Add(Severity::Warning, "unknown-category", pointer,
+        Add(Severity::Warning, "unknown-category", where,
             u"category " + Quoted(name) + u" is not registered; its styles are skipped");
         continue;
       }
       const PropertyKey categoryKey(name);
+      m_styles.reserve(m_styles.size() + category->GetSize());
+      m_nodes.reserve(m_nodes.size() + category->GetSize());
       for (std::size_t j = 0; j < category->GetSize(); ++j) {
         const Text& styleName = category->GetValueName(j);
-        const Text stylePointer = AppendPointer(pointer, styleName);
+        const Where styleWhere{&where, &styleName};
         const Json::Object* object = category->GetValue(j).GetIf<Json::Object>();
         if (!object) {
-          Add(Severity::Error, "style-not-object", stylePointer,
+          Add(Severity::Error, "style-not-object", styleWhere,
               u"style " + Quoted(styleName) + u" must be an object");
           continue;
         }
-        m_styles.push_back(
-            DocumentStyle{styleName, categoryKey, stylePointer, object, AddName(styleName, stylePointer, categoryKey)});
+        m_styles.push_back(DocumentStyle{&name, &styleName, categoryKey, object,
+                                         AddName(styleName, styleWhere, categoryKey)});
       }
     }
   }
 
-  void CheckSheetMember(const Text& name, const Json::Value& value, const Text& pointer) {
+  void CheckSheetMember(const Text& name, const Json::Value& value, const Where& where) {
     if (name == kVersion) {
       if (const double* number = value.GetIf<double>()) {
         m_documentVersion = TruncateVersion(*number);
         m_versionSeen = true;
-        m_versionPointer = pointer;
       } else {
-        Add(Severity::Error, "wrong-kind", pointer, u"the version must be a number");
+        Add(Severity::Error, "wrong-kind", where, u"the version must be a number");
       }
     } else if (name == kExternalID) {
       if (!value.Is<Text>())
-        Add(Severity::Error, "wrong-kind", pointer, u"the sheet's id must be a string");
+        Add(Severity::Error, "wrong-kind", where, u"the sheet's id must be a string");
     } else {
-      Add(Severity::Warning, "unknown-member", pointer,
+      Add(Severity::Warning, "unknown-member", where,
           u"member " + Quoted(name) + u" is neither a category, the version nor the id");
     }
   }
 
   // The node of a document style name, reporting a name used twice.
-  std::size_t AddName(const Text& name, const Text& pointer, const PropertyKey& category) {
-    const auto found = m_documentNames.find(name);
-    if (found != m_documentNames.end()) {
-      const Text& first = found->first;
-      Add(Severity::Error, "duplicate-name", pointer,
+  std::size_t AddName(const Text& name, const Where& where, const PropertyKey& category) {
+    const auto [found, added] = m_documentNames.emplace(name.GetView(), m_nodes.size());
+    if (!added) {
+      const Text first(found->first);
+      Add(Severity::Error, "duplicate-name", where,
           first == name ? u"style " + Quoted(name) + u" appears twice in the document"
                         : u"style " + Quoted(name) + u" differs only in letter case from " +
                               Quoted(first));
       m_nodes[found->second].category = category; // the last reading wins
       return found->second;
     }
-    const std::size_t node = m_nodes.size();
-    m_nodes.push_back(Node{category, nullptr, kNone, true, Text()});
-    m_documentNames.emplace(name, node);
+    m_nodes.push_back(Node{category, nullptr, kNone, true, kNone});
     if (m_target && !m_replace && m_target->GetStyle(name))
-      Add(Severity::Warning, "name-taken", pointer,
+      Add(Severity::Warning, "name-taken", where,
           u"the sheet already has a style " + Quoted(name) + u"; the document's is not imported");
-    return node;
+    return found->second;
   }
 
   // The style a parent name stands for, as the import resolves it.
   std::size_t Resolve(const Text& name) {
     const Style* targetStyle = m_target ? m_target->GetStyle(name) : nullptr;
-    const auto documentNode = m_documentNames.find(name);
+    const auto documentNode = m_documentNames.find(name.GetView());
     if (documentNode != m_documentNames.end() && (!targetStyle || m_replace))
       return documentNode->second;
     if (!targetStyle)
@@ -215,7 +246,7 @@ private:
     if (known != m_targetNodes.end())
       return known->second;
     const std::size_t node = m_nodes.size();
-    m_nodes.push_back(Node{targetStyle->GetCategoryName(), targetStyle, kNone, false, Text()});
+    m_nodes.push_back(Node{targetStyle->GetCategoryName(), targetStyle, kNone, false, kNone});
     m_targetNodes.emplace(targetStyle, node);
     return node;
   }
@@ -227,16 +258,17 @@ private:
       // document is followed by the document's style of that name.
       const Style* parent = m_nodes[node].targetStyle->GetParent();
       const Text parentName = m_target->GetStyleName(parent);
-      m_nodes[node].parent = parentName.IsEmpty() ? kNone : Resolve(parentName);
+      const std::size_t parentNode = parentName.IsEmpty() ? kNone : Resolve(parentName);
+      m_nodes[node].parent = parentNode;
     }
     return m_nodes[node].parent;
   }
 
-  void CheckStyle(const Json::Object& object, const PropertyKey& categoryKey, const Text& pointer,
+  void CheckStyle(const Json::Object& object, const PropertyKey& categoryKey, const Where& where,
                   std::size_t node) {
     const std::shared_ptr<StyleCategory>* category = m_manager.FindCategory(categoryKey);
     if (!category) {
-      Add(Severity::Warning, "unknown-category", pointer,
+      Add(Severity::Warning, "unknown-category", where,
           u"category " + Quoted(categoryKey.GetString()) +
               u" is not registered; the substyle is read empty");
       return;
@@ -244,79 +276,79 @@ private:
     for (std::size_t i = 0; i < object.GetSize(); ++i) {
       const Text& name = object.GetValueName(i);
       const Json::Value& value = object.GetValue(i);
-      const Text memberPointer = AppendPointer(pointer, name);
+      const Where member{&where, &name};
       if (name == kInherits) {
-        CheckInherits(value, categoryKey, memberPointer, node);
+        CheckInherits(value, categoryKey, member, node);
       } else if (name == kExternalID || name == kExternalName) {
         if (!value.Is<Text>())
-          Add(Severity::Error, "wrong-kind", memberPointer, Quoted(name) + u" must be a string");
+          Add(Severity::Error, "wrong-kind", member, Quoted(name) + u" must be a string");
       } else {
         const std::optional<PropertyKey> key = PropertyKey::Find(name.GetView());
         const BaseStyleProperty* behaviour = key ? (*category)->GetStyleProperty(*key) : nullptr;
         if (!behaviour) {
-          Add(Severity::Warning, "unknown-property", memberPointer,
+          Add(Severity::Warning, "unknown-property", member,
               u"property " + Quoted(name) + u" is not registered in category " +
                   Quoted(categoryKey.GetString()) + u"; it is skipped");
           continue;
         }
         if (behaviour->IsDeprecated())
-          Add(Severity::Warning, "deprecated-property", memberPointer,
+          Add(Severity::Warning, "deprecated-property", member,
               u"property " + Quoted(name) + u" is deprecated");
         if (behaviour->GetMinimumVersion() > m_documentVersion)
-          Add(Severity::Warning, "property-too-new", memberPointer,
+          Add(Severity::Warning, "property-too-new", member,
               u"property " + Quoted(name) + u" needs version " +
                   Widen(std::to_string(behaviour->GetMinimumVersion())) +
                   u", newer than the document's");
-        CheckValue(*behaviour, name, value, memberPointer);
+        CheckValue(*behaviour, name, value, member);
       }
     }
   }
 
-  void CheckInherits(const Json::Value& value, const PropertyKey& categoryKey, const Text& pointer,
+  void CheckInherits(const Json::Value& value, const PropertyKey& categoryKey, const Where& where,
                      std::size_t node) {
     const Text* name = value.GetIf<Text>();
     if (!name) {
-      Add(Severity::Error, "wrong-kind", pointer, u"\"inherits\" must be a string");
+      Add(Severity::Error, "wrong-kind", where, u"\"inherits\" must be a string");
       return;
     }
     if (name->IsEmpty())
       return;
     const WImportStyleInfo& info = m_manager.GetImportStyleInfo();
-    if (info.names.count(*name))
+    if (!info.names.empty() && info.names.count(*name))
       return; // the host asked for this name to be left alone
-    const auto renamed = info.renames.find(*name);
+    const auto renamed = info.renames.empty() ? info.renames.end() : info.renames.find(*name);
     const Text& parentName = renamed != info.renames.end() ? renamed->second : *name;
     const std::size_t parent = Resolve(parentName);
     if (parent == kNone) {
-      Add(Severity::Error, "missing-parent", pointer,
+      Add(Severity::Error, "missing-parent", where,
           u"no style " + Quoted(parentName) + u" to inherit from");
       return;
     }
     if (m_nodes[parent].category != categoryKey)
-      Add(Severity::Error, "parent-category", pointer,
+      Add(Severity::Error, "parent-category", where,
           u"parent " + Quoted(parentName) + u" is of category " +
               Quoted(m_nodes[parent].category.GetString()) + u", not " +
               Quoted(categoryKey.GetString()));
     if (node != kNone) {
       m_nodes[node].parent = parent;
-      m_nodes[node].edgePointer = pointer;
+      m_nodes[node].edgeStyle = m_current;
     }
   }
 
   void CheckValue(const BaseStyleProperty& behaviour, const Text& name, const Json::Value& value,
-                  const Text& pointer) {
+                  const Where& where) {
     if (dynamic_cast<const StyleSetProperty*>(&behaviour)) {
       if (const Json::Object* object = value.GetIf<Json::Object>())
-        CheckStyle(*object, behaviour.GetElementCategoryName(), pointer, kNone);
+        CheckStyle(*object, behaviour.GetElementCategoryName(), where, kNone);
       else if (!value.IsNull())
-        Add(Severity::Error, "wrong-kind", pointer,
+        Add(Severity::Error, "wrong-kind", where,
             u"substyle " + Quoted(name) + u" must be an object or null");
       return;
     }
     if (dynamic_cast<const StyleArrayProperty*>(&behaviour)) {
       const Json::Array* array = value.GetIf<Json::Array>();
       if (!array) {
-        Add(Severity::Error, "wrong-kind", pointer,
+        Add(Severity::Error, "wrong-kind", where,
             u"array " + Quoted(name) + u" must be an array of objects");
         return;
       }
@@ -324,11 +356,11 @@ private:
       if (element == PropertyKey::Empty)
         element = behaviour.GetCategoryKey();
       for (std::size_t i = 0; i < array->GetSize(); ++i) {
-        const Text elementPointer = AppendPointer(pointer, i);
+        const Where elementWhere{&where, nullptr, i};
         if (const Json::Object* object = array->GetValue(i).GetIf<Json::Object>())
-          CheckStyle(*object, element, elementPointer, kNone);
+          CheckStyle(*object, element, elementWhere, kNone);
         else
-          Add(Severity::Error, "wrong-kind", elementPointer,
+          Add(Severity::Error, "wrong-kind", elementWhere,
               u"an element of " + Quoted(name) + u" must be an object");
       }
       return;
@@ -344,26 +376,26 @@ private:
       text = Text::FormatInternal("%g", *number);
       const std::string ascii(text.begin(), text.end());
       if (std::strtod(ascii.c_str(), nullptr) != *number)
-        Add(Severity::Warning, "number-rounded", pointer,
+        Add(Severity::Warning, "number-rounded", where,
             u"the number is read as " + text + u"; write it as a string to keep every digit");
     } else if (const bool* flag = value.GetIf<bool>()) {
       text = *flag ? u"1" : u"0";
     } else {
-      Add(Severity::Error, "wrong-kind", pointer,
+      Add(Severity::Error, "wrong-kind", where,
           u"property " + Quoted(name) + u" must be a string, a number or true or false");
       return;
     }
     try {
       const ZelUtils::Any converted = policy->FromText(text);
       if (!behaviour.CheckType(converted))
-        Add(Severity::Error, "type-rejected", pointer,
+        Add(Severity::Error, "type-rejected", where,
             Quoted(text) + u" is not an allowed value of " + Quoted(name));
     } catch (const std::exception&) {
       if (IsRepairedName(name))
-        Add(Severity::Warning, "value-replaced", pointer,
+        Add(Severity::Warning, "value-replaced", where,
             Quoted(text) + u" cannot be read; the import stores the neutral value instead");
       else
-        Add(Severity::Error, "bad-value", pointer,
+        Add(Severity::Error, "bad-value", where,
             Quoted(text) + u" cannot be read as a value of " + Quoted(name));
     }
   }
@@ -386,10 +418,15 @@ private:
       }
       if (node != kNone && state[node] == 1) {
         const auto first = std::find(walk.begin(), walk.end(), node);
-        for (auto it = first; it != walk.end(); ++it)
-          if (!m_nodes[*it].edgePointer.IsEmpty())
-            Add(Severity::Error, "inheritance-cycle", m_nodes[*it].edgePointer,
-                u"this parent would make the style inherit from itself; the import ignores it");
+        for (auto it = first; it != walk.end(); ++it) {
+          const std::size_t edge = m_nodes[*it].edgeStyle;
+          if (edge == kNone)
+            continue;
+          const Where category{nullptr, m_styles[edge].categoryName};
+          const Where style{&category, m_styles[edge].name};
+          Add(Severity::Error, "inheritance-cycle", Where{&style, &kInheritsName},
+              u"this parent would make the style inherit from itself; the import ignores it");
+        }
       }
       for (const std::size_t visited : walk)
         state[visited] = 2;
@@ -401,10 +438,10 @@ private:
   bool m_replace;
   int m_documentVersion = 0;
   bool m_versionSeen = false;
-  Text m_versionPointer;
   std::vector<DocumentStyle> m_styles;
+  std::size_t m_current = kNone; // the document style being checked
   std::vector<Node> m_nodes;
-  std::map<Text, std::size_t, ZelUtils::String::LessThanCaseInsensitive> m_documentNames;
+  NameMap m_documentNames;
   std::unordered_map<const Style*, std::size_t> m_targetNodes;
   std::vector<Diagnostic> m_diagnostics;
 };
@@ -458,16 +495,23 @@ std::vector<Diagnostic> ValidateDocument(const Json::Object& document, const Sty
 bool ImportChecked(StyleSheet& target, const Text& text, bool replace,
                    std::vector<Diagnostic>* diagnostics) {
   std::vector<Diagnostic> found;
+  Json::Value value;
+  if (Json::Object* document = ParseDocument(text, value, found))
+    return ImportChecked(target, *document, replace, diagnostics);
+  if (diagnostics)
+    *diagnostics = std::move(found);
+  return false;
+}
+
+bool ImportChecked(StyleSheet& target, Json::Object& document, bool replace,
+                   std::vector<Diagnostic>* diagnostics) {
+  std::vector<Diagnostic> found;
   const auto finish = [&](bool imported) {
     if (diagnostics)
       *diagnostics = std::move(found);
     return imported;
   };
-  Json::Value value;
-  Json::Object* document = ParseDocument(text, value, found);
-  if (!document)
-    return finish(false);
-  found = ValidateDocument(*document, &target, replace);
+  found = ValidateDocument(document, &target, replace);
   if (HasErrors(found))
     return finish(false);
 
@@ -494,7 +538,7 @@ bool ImportChecked(StyleSheet& target, const Text& text, bool replace,
     }
 
   try {
-    scratch.ImportJson(document, replace);
+    scratch.ImportJson(&document, replace);
   } catch (const std::exception& error) {
     found.push_back(Diagnostic{Severity::Error, "behaviour-failed", Text(),
                                u"reading the document failed (" + Widen(error.what()) +
@@ -512,16 +556,18 @@ bool ImportChecked(StyleSheet& target, const Text& text, bool replace,
   // address may have been reused by a new style, hence the mark.
   std::map<Style*, Style*> toOriginals;
   std::vector<std::pair<Text, Style*>> created;
-  for (const Text& name : scratch.GetStyleNames()) {
-    Style* style = scratch.GetStyle(name);
+  const std::vector<Text> names = scratch.GetStyleNames();
+  const std::vector<Style*> styles = scratch.GetStyles(); // the same order
+  for (std::size_t i = 0; i < names.size(); ++i) {
+    Style* style = styles[i];
     if (style && standInSet.count(style) && style->GetExternalName() == StandInMark())
-      toOriginals.emplace(style, target.GetStyle(name));
+      toOriginals.emplace(style, target.GetStyle(names[i]));
     else
-      created.emplace_back(name, style);
+      created.emplace_back(names[i], style);
   }
   for (auto& [name, style] : created) {
     scratch.RemoveStyle(style);
-    if (style)
+    if (style && !toOriginals.empty())
       style->RemapDependency(toOriginals);
   }
 
@@ -548,6 +594,75 @@ bool ImportChecked(StyleSheet& target, const Text& text, bool replace,
   target.SetVersion(scratch.GetVersion());
   target.SetExternalID(scratch.GetExternalID());
   return finish(true);
+}
+
+Json::Object SelectStyles(const Json::Object& document, const std::vector<Text>& names) {
+  StyleManager& manager = GetStyleManager();
+  // Every style member of a registered category, by name ignoring case.
+  std::map<std::u16string_view, std::vector<const Json::Value*>,
+           ZelUtils::String::LessThanCaseInsensitive>
+      members;
+  for (std::size_t i = 0; i < document.GetSize(); ++i) {
+    const Json::Object* category = document.GetValue(i).GetIf<Json::Object>();
+    if (!category || !manager.CategoryExists(document.GetValueName(i)))
+      continue;
+    for (std::size_t j = 0; j < category->GetSize(); ++j)
+      members[category->GetValueName(j).GetView()].push_back(&category->GetValue(j));
+  }
+
+  // The names needed, found by following every "inherits" at any depth.
+  const WImportStyleInfo& info = manager.GetImportStyleInfo();
+  std::unordered_set<const Json::Value*> selected;
+  std::vector<const Json::Value*> pending;
+  const auto need = [&](const Text& name) {
+    if (info.names.count(name))
+      return;
+    const auto renamed = info.renames.find(name);
+    const auto found = members.find((renamed != info.renames.end() ? renamed->second : name).GetView());
+    if (found == members.end())
+      return;
+    for (const Json::Value* member : found->second)
+      if (selected.insert(member).second)
+        pending.push_back(member);
+  };
+  for (const Text& name : names)
+    need(name);
+  while (!pending.empty()) {
+    const Json::Value* value = pending.back();
+    pending.pop_back();
+    if (const Json::Object* object = value->GetIf<Json::Object>()) {
+      for (std::size_t i = 0; i < object->GetSize(); ++i) {
+        const Json::Value& member = object->GetValue(i);
+        if (const Text* parent = member.GetIf<Text>()) {
+          if (object->GetValueName(i) == kInherits)
+            need(*parent);
+        } else if (member.Is<Json::Object>() || member.Is<Json::Array>()) {
+          pending.push_back(&member); // substyles and their lists
+        }
+      }
+    } else if (const Json::Array* array = value->GetIf<Json::Array>()) {
+      for (std::size_t i = 0; i < array->GetSize(); ++i)
+        pending.push_back(&array->GetValue(i));
+    }
+  }
+
+  Json::Object part;
+  for (std::size_t i = 0; i < document.GetSize(); ++i) {
+    const Text& name = document.GetValueName(i);
+    const Json::Value& value = document.GetValue(i);
+    const Json::Object* category = value.GetIf<Json::Object>();
+    if (!category) {
+      part.AddValue(name, value);
+      continue;
+    }
+    Json::Object kept;
+    for (std::size_t j = 0; j < category->GetSize(); ++j)
+      if (selected.count(&category->GetValue(j)))
+        kept.AddValue(category->GetValueName(j), category->GetValue(j));
+    if (!kept.IsEmpty())
+      part.AddValue(name, Json::Value(std::move(kept)));
+  }
+  return part;
 }
 
 } // namespace Tools

@@ -67,6 +67,19 @@ ValidateDocument(const Json::Object& document, const StyleSheet* target = nullpt
 // (may be null) receives every diagnostic, warnings included.
 STYLES_TOOLS_API bool ImportChecked(StyleSheet& target, const ZelStringT<char16_t>& text,
                                     bool replace, std::vector<Diagnostic>* diagnostics);
+// The same for a parsed document, which is not changed (StyleSheet::ImportJson
+// takes it as non-const).
+STYLES_TOOLS_API bool ImportChecked(StyleSheet& target, Json::Object& document, bool replace,
+                                    std::vector<Diagnostic>* diagnostics);
+
+// The part of `document` that the styles called `names` (letter case
+// ignored) depend on: the sheet's own members, and every style member, in
+// every registered category and in document order, whose name is one of
+// `names` or is named by an "inherits" inside such a member, again and again.
+// Reading it into an empty sheet gives those styles the same effective values
+// as reading the whole document, at the cost of their dependencies only.
+STYLES_TOOLS_API Json::Object SelectStyles(const Json::Object& document,
+                                           const std::vector<ZelStringT<char16_t>>& names);
 
 } // namespace Tools
 } // namespace Styles
