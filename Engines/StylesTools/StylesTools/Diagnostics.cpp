@@ -405,7 +405,7 @@ private:
   // every cycle in linear time.
   void FindCycles() {
     std::vector<unsigned char> state(m_nodes.size(), 0); // 0 new, 1 on the walk, 2 done
-    std::vector<std::size_t> walk;
+    std::vector<std::size_t> walk, closing;
     for (std::size_t start = 0; start < m_nodes.size(); ++start) {
       walk.clear();
       std::size_t node = start;
@@ -416,20 +416,20 @@ private:
         if (state.size() < m_nodes.size())
           state.resize(m_nodes.size(), 0);
       }
-      if (node != kNone && state[node] == 1) {
-        const auto first = std::find(walk.begin(), walk.end(), node);
-        for (auto it = first; it != walk.end(); ++it) {
-          const std::size_t edge = m_nodes[*it].edgeStyle;
-          if (edge == kNone)
-            continue;
-          const Where category{nullptr, m_styles[edge].categoryName};
-          const Where style{&category, m_styles[edge].name};
-          Add(Severity::Error, "inheritance-cycle", Where{&style, &kInheritsName},
-              u"this parent would make the style inherit from itself; the import ignores it");
-        }
-      }
+      if (node != kNone && state[node] == 1)
+        for (auto it = std::find(walk.begin(), walk.end(), node); it != walk.end(); ++it)
+          if (m_nodes[*it].edgeStyle != kNone)
+            closing.push_back(m_nodes[*it].edgeStyle);
       for (const std::size_t visited : walk)
         state[visited] = 2;
+    }
+    // In document order, like the other diagnostics.
+    std::sort(closing.begin(), closing.end());
+    for (const std::size_t edge : closing) {
+      const Where category{nullptr, m_styles[edge].categoryName};
+      const Where style{&category, m_styles[edge].name};
+      Add(Severity::Error, "inheritance-cycle", Where{&style, &kInheritsName},
+          u"this parent would make the style inherit from itself; the import ignores it");
     }
   }
 
