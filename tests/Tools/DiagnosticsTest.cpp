@@ -110,8 +110,8 @@ TEST_F(DiagnosticsTest, EachCodeFromTheSmallestDocumentThatRaisesIt) {
       {"version-too-new", R"({"version": 2})", "/version", Severity::Warning},
       {"property-too-new", R"({"version": 1, "shape": {"S": {"outline": "1"}}})",
        "/shape/S/outline", Severity::Warning},
-      {"deprecated-property", R"({"shape": {"S": {"legacyWidth": "1"}}})",
-       "/shape/S/legacyWidth", Severity::Warning},
+      {"deprecated-property", R"({"shape": {"S": {"legacyWidth": "1"}}})", "/shape/S/legacyWidth",
+       Severity::Warning},
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.document);
@@ -167,9 +167,10 @@ TEST_F(DiagnosticsTest, ATargetSheetDecidesWhatNamesStandFor) {
 TEST_F(DiagnosticsTest, AFailedImportLeavesTheTargetExactlyAsItWas) {
   StyleSheet target;
   target.SetExternalID(u"sheet");
-  ASSERT_TRUE(target.ImportFromString(u"{\"version\": 1, \"paragraph\": {\"Base\": {\"spaceAfter\": "
-                                      u"\"1\"}, \"Child\": {\"inherits\": \"Base\"}}}",
-                                      true));
+  ASSERT_TRUE(
+      target.ImportFromString(u"{\"version\": 1, \"paragraph\": {\"Base\": {\"spaceAfter\": "
+                              u"\"1\"}, \"Child\": {\"inherits\": \"Base\"}}}",
+                              true));
   const std::string before = Exported(target);
   Style* base = target.GetStyle(u"Base");
   Style* child = target.GetStyle(u"Child");
@@ -190,8 +191,8 @@ TEST_F(DiagnosticsTest, AFailedImportLeavesTheTargetExactlyAsItWas) {
     EXPECT_EQ(target.GetExternalID(), Text(u"sheet"));
   }
   // Errors found by validation stop the import before anything is read.
-  EXPECT_FALSE(ImportChecked(target, u"{\"paragraph\": {\"X\": {\"inherits\": \"Y\"}}}", true,
-                             nullptr));
+  EXPECT_FALSE(
+      ImportChecked(target, u"{\"paragraph\": {\"X\": {\"inherits\": \"Y\"}}}", true, nullptr));
   EXPECT_EQ(Exported(target), before);
 }
 
@@ -277,9 +278,10 @@ TEST_F(DiagnosticsTest, SelectingAStyleKeepsWhatItDependsOn) {
       "unknown": {"A": {}}})"),
                           value, error));
   const Json::Object part = SelectStyles(value.Get<Json::Object>(), {u"a"});
-  EXPECT_EQ(U8(Json::ValueToString(Json::Value(part), false)),
-            R"({"version":1,"paragraph":{"A":{"inherits":"b"},"B":{"character":{"inherits":"Em"}}},)"
-            R"("character":{"Em":{"inherits":"Base"},"base":{}}})");
+  EXPECT_EQ(
+      U8(Json::ValueToString(Json::Value(part), false)),
+      R"({"version":1,"paragraph":{"A":{"inherits":"b"},"B":{"character":{"inherits":"Em"}}},)"
+      R"("character":{"Em":{"inherits":"Base"},"base":{}}})");
 }
 
 } // namespace

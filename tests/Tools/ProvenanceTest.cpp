@@ -61,7 +61,9 @@ std::string RandomSheet(std::mt19937& random, int count) {
   const auto chance = [&](int percent) { return static_cast<int>(random() % 100) < percent; };
   const auto pick = [&](int n) { return static_cast<int>(random() % static_cast<unsigned>(n)); };
   const char* const kCategories[] = {"leaf", "mid", "top"};
-  const auto name = [&](int category, int i) { return std::string(1, "lmt"[category]) + std::to_string(i); };
+  const auto name = [&](int category, int i) {
+    return std::string(1, "lmt"[category]) + std::to_string(i);
+  };
   // Top-level styles mostly inherit, substyles seldom: they mostly resolve
   // through their owners.
   const auto inherits = [&](int category, int below, int depth) -> std::string {
@@ -86,7 +88,8 @@ std::string RandomSheet(std::mt19937& random, int count) {
       if (category == 2 && chance(60))
         text += "\"mid\": " + body(1, count, depth + 1) + ", ";
       if (category == 2 && chance(25))
-        text += "\"items\": [" + body(1, count, depth + 1) + ", " + body(1, count, depth + 1) + "], ";
+        text +=
+            "\"items\": [" + body(1, count, depth + 1) + ", " + body(1, count, depth + 1) + "], ";
     }
     if (text.size() > 1 && text[text.size() - 2] == ',')
       text.resize(text.size() - 2);
@@ -136,7 +139,7 @@ bool IsAncestor(const Style& style, const Style* candidate) {
 TEST_F(ProvenanceTest, ResolutionAgreesWithTheCoreOnGeneratedSheets) {
   std::mt19937 random(4711);
   const std::vector<PropertyPath> paths = {
-      SplitPath(u"width"), SplitPath(u"mid.gap"), SplitPath(u"mid.leaf.size"),
+      SplitPath(u"width"),    SplitPath(u"mid.gap"),   SplitPath(u"mid.leaf.size"),
       SplitPath(u"leaf.tag"), SplitPath(u"items.gap"), SplitPath(u"mid.leaf.nothing")};
   int compared = 0, thrown = 0, throughOwners = 0, severalOwnersUp = 0, flattened = 0;
   for (int round = 0; round < 100; ++round) {

@@ -93,9 +93,9 @@ TEST(SchemaTest, ASchemaNamingARegisteredCategoryIsRefusedWhole) {
 
   // "fresh" comes first and is new, yet nothing of this schema may stay.
   Schema second;
-  ASSERT_TRUE(ParseSchema(
-      U16(R"({"version": 5, "categories": [{"key": "fresh"}, {"key": "character"}]})"), second,
-      error));
+  ASSERT_TRUE(
+      ParseSchema(U16(R"({"version": 5, "categories": [{"key": "fresh"}, {"key": "character"}]})"),
+                  second, error));
   SchemaRegistration refused;
   EXPECT_FALSE(RegisterSchema(second, refused, error));
   EXPECT_EQ(U8(error.pointer), "/categories/1/key");
@@ -182,11 +182,13 @@ TEST(SchemaTest, FlagsAndVersionsShapeWhatIsWritten) {
   ASSERT_TRUE(RegisterSchema(schema, registration, error)) << U8(error.message);
   {
     StyleManager& manager = GetStyleManager();
-    const BaseStyleProperty* noteSet = manager.GetStyleProperty(StyleCategoryName, PropertyKey(u"note"));
+    const BaseStyleProperty* noteSet =
+        manager.GetStyleProperty(StyleCategoryName, PropertyKey(u"note"));
     ASSERT_NE(noteSet, nullptr);
     EXPECT_TRUE(noteSet->IsSubstyle());
     EXPECT_EQ(manager.TranslateCategory(StyleCategoryName), Text(u"Ordinary"));
-    EXPECT_TRUE(manager.GetStyleProperty(PropertyKey(u"note"), PropertyKey(u"old"))->IsDeprecated());
+    EXPECT_TRUE(
+        manager.GetStyleProperty(PropertyKey(u"note"), PropertyKey(u"old"))->IsDeprecated());
 
     StyleSheet sheet;
     ASSERT_TRUE(sheet.ImportFromString(
@@ -195,7 +197,8 @@ TEST(SchemaTest, FlagsAndVersionsShapeWhatIsWritten) {
         true));
     Text text;
     sheet.ExportToString(text, false);
-    EXPECT_EQ(U8(text), R"({"version":3,"note":{"N":{"text":"t","recent":"7","inner":{"text":"i"}}}})")
+    EXPECT_EQ(U8(text),
+              R"({"version":3,"note":{"N":{"text":"t","recent":"7","inner":{"text":"i"}}}})")
         << "temporary properties stay out unless asked for";
     sheet.SetVersion(2);
     sheet.ExportToString(text, true);

@@ -114,7 +114,8 @@ int CheckPresetArguments(const std::string& folder, const std::string& set) {
 // The preset manager loads sets with a plain import; a damaged set file is
 // caught here first, so that it is reported instead of half read.
 int CheckPresetFile(const std::string& folder, const std::string& set) {
-  const std::string path = ToUtf8(SystemIO::Path::Combine(FromUtf8(folder), FromUtf8(set + ".qsty")));
+  const std::string path =
+      ToUtf8(SystemIO::Path::Combine(FromUtf8(folder), FromUtf8(set + ".qsty")));
   Text text;
   if (!ReadText(path, text) || Text(text).Trim().IsEmpty())
     return kSuccess; // no set, or one saved without a sheet
@@ -141,9 +142,10 @@ bool RegisterSchemaFile(const std::string& path, int& status) {
     }
     Styles::Tools::SchemaError error;
     if (!Styles::Tools::ParseSchema(text, schema, error)) {
-      Output::Error(DisplayName(path),
-                    "not a schema: " + (error.pointer.IsEmpty() ? "" : ToUtf8(error.pointer) + ": ") +
-                        ToUtf8(error.message));
+      Output::Error(
+          DisplayName(path),
+          "not a schema: " + (error.pointer.IsEmpty() ? "" : ToUtf8(error.pointer) + ": ") +
+              ToUtf8(error.message));
       status = kUsage;
       return false;
     }
@@ -301,7 +303,8 @@ int PresetAdd(const CommonOptions& options, const std::string& folder, const std
     return kNegative;
   }
   presets.AddPreset(setName, presetName, style, replace);
-  Output(options.json).Message("added preset \"" + ToUtf8(presetName) + "\" to set \"" + set + "\"");
+  Output(options.json)
+      .Message("added preset \"" + ToUtf8(presetName) + "\" to set \"" + set + "\"");
   return kSuccess;
 }
 

@@ -12,13 +12,7 @@
 
 namespace StylesCommand {
 
-enum ExitStatus : int {
-  kSuccess = 0,
-  kNegative = 1,
-  kUsage = 2,
-  kUnreadable = 3,
-  kUnusable = 4
-};
+enum ExitStatus : int { kSuccess = 0, kNegative = 1, kUsage = 2, kUnreadable = 3, kUnusable = 4 };
 
 // Options every command takes.
 struct CommonOptions {

@@ -29,7 +29,9 @@ constexpr std::size_t kMaxIndent = 24;
 
 void Print(const Text& text) { std::cout << ToUtf8(text); }
 
-void PrintJson(const Json::Value& value) { std::cout << ToUtf8(Json::ValueToString(value, true)) << '\n'; }
+void PrintJson(const Json::Value& value) {
+  std::cout << ToUtf8(Json::ValueToString(value, true)) << '\n';
+}
 
 Json::Value TextOrNull(const Text& text, bool present) {
   return present ? Json::Value(text) : Json::Value();
@@ -117,8 +119,8 @@ void Output::Error(const std::string& file, const Text& message) { Error(file, T
 void Output::DocumentErrors(const std::string& file, const std::vector<Diagnostic>& diagnostics) {
   for (const Diagnostic& d : diagnostics)
     if (d.severity == Severity::Error)
-      Error(file, ToUtf8(d.pointer) + (d.pointer.IsEmpty() ? "" : ": ") + ToUtf8(d.message) +
-                      " [" + d.code + "]");
+      Error(file, ToUtf8(d.pointer) + (d.pointer.IsEmpty() ? "" : ": ") + ToUtf8(d.message) + " [" +
+                      d.code + "]");
   Error(file, "the document has errors; \"styles validate\" lists them all");
 }
 
@@ -227,7 +229,8 @@ void Output::Tree(const StyleSheet& sheet) const {
 }
 
 void Output::Values(const StyleSheet& sheet, const Style& style, bool explain) const {
-  const std::vector<Styles::Tools::EffectiveValue> values = Styles::Tools::ListEffectiveValues(style);
+  const std::vector<Styles::Tools::EffectiveValue> values =
+      Styles::Tools::ListEffectiveValues(style);
   const Text name = Styles::Tools::DescribeStyle(sheet, &style);
   const Text parent = sheet.GetStyleName(style.GetParent());
   if (m_json) {
@@ -235,8 +238,8 @@ void Output::Values(const StyleSheet& sheet, const Style& style, bool explain) c
     for (const Styles::Tools::EffectiveValue& value : values) {
       Json::Object item;
       item.AddValue(u"path", Json::Value(value.path));
-      item.AddValue(u"value",
-                    Json::Value(Styles::Tools::FormatValue(*value.behaviour, *value.resolution.value)));
+      item.AddValue(u"value", Json::Value(Styles::Tools::FormatValue(*value.behaviour,
+                                                                     *value.resolution.value)));
       item.AddValue(u"source", AsciiText(SourceName(value.resolution.source)));
       const Text from = Styles::Tools::DescribeStyle(sheet, value.resolution.holder);
       const bool inherited = value.resolution.source == ValueSource::Ancestor ||
@@ -259,17 +262,20 @@ void Output::Values(const StyleSheet& sheet, const Style& style, bool explain) c
   std::size_t pathWidth = 0, valueWidth = 0;
   std::vector<std::pair<std::string, std::string>> lines;
   for (const Styles::Tools::EffectiveValue& value : values) {
-    lines.emplace_back(ToUtf8(value.path),
-                       ToUtf8(Styles::Tools::FormatValue(*value.behaviour, *value.resolution.value)));
+    lines.emplace_back(ToUtf8(value.path), ToUtf8(Styles::Tools::FormatValue(
+                                               *value.behaviour, *value.resolution.value)));
     pathWidth = std::max(pathWidth, lines.back().first.size());
     valueWidth = std::max(valueWidth, lines.back().second.size());
   }
   pathWidth = std::min<std::size_t>(pathWidth + 2, 40);
   valueWidth = std::min<std::size_t>(valueWidth + 2, 40);
   for (std::size_t i = 0; i < values.size(); ++i) {
-    std::cout << "  " << (explain ? Padded(lines[i].first, pathWidth) : Padded(lines[i].first, pathWidth) + lines[i].second);
+    std::cout << "  "
+              << (explain ? Padded(lines[i].first, pathWidth)
+                          : Padded(lines[i].first, pathWidth) + lines[i].second);
     if (explain)
-      std::cout << Padded(lines[i].second, valueWidth) << ToUtf8(Explain(sheet, values[i].resolution));
+      std::cout << Padded(lines[i].second, valueWidth)
+                << ToUtf8(Explain(sheet, values[i].resolution));
     std::cout << '\n';
   }
 }

@@ -97,7 +97,7 @@ bool ParseErrorOffset(const Text& message, std::size_t& offset) {
 // level holds its token and the level above, on the stack of the walk.
 struct Where {
   const Where* up;
-  const Text* name;      // the member's name, or null for an array index
+  const Text* name; // the member's name, or null for an array index
   std::size_t index = 0;
 
   Text Spell() const {
@@ -221,9 +221,9 @@ private:
     if (!added) {
       const Text first(found->first);
       Add(Severity::Error, "duplicate-name", where,
-          first == name ? u"style " + Quoted(name) + u" appears twice in the document"
-                        : u"style " + Quoted(name) + u" differs only in letter case from " +
-                              Quoted(first));
+          first == name
+              ? u"style " + Quoted(name) + u" appears twice in the document"
+              : u"style " + Quoted(name) + u" differs only in letter case from " + Quoted(first));
       m_nodes[found->second].category = category; // the last reading wins
       return found->second;
     }
@@ -460,8 +460,8 @@ Json::Object* ParseDocument(const Text& text, Json::Value& value,
   }
   Json::Object* document = value.GetIf<Json::Object>();
   if (!document)
-    diagnostics.push_back(
-        Diagnostic{Severity::Error, "not-an-object", Text(), u"a sheet document is a JSON object", 0, 0});
+    diagnostics.push_back(Diagnostic{Severity::Error, "not-an-object", Text(),
+                                     u"a sheet document is a JSON object", 0, 0});
   return document;
 }
 
@@ -524,7 +524,8 @@ bool ImportChecked(StyleSheet& target, Json::Object& document, bool replace,
   std::unordered_set<const Style*> standInSet;
   for (const Text& name : target.GetStyleNames()) {
     const Style* original = target.GetStyle(name);
-    Style* standIn = new Style(nullptr, original ? original->GetCategoryName() : PropertyKey::Empty);
+    Style* standIn =
+        new Style(nullptr, original ? original->GetCategoryName() : PropertyKey::Empty);
     standIn->SetExternalName(StandInMark());
     standIns.emplace(original, standIn);
     standInSet.insert(standIn);
@@ -540,10 +541,9 @@ bool ImportChecked(StyleSheet& target, Json::Object& document, bool replace,
   try {
     scratch.ImportJson(&document, replace);
   } catch (const std::exception& error) {
-    found.push_back(Diagnostic{Severity::Error, "behaviour-failed", Text(),
-                               u"reading the document failed (" + Widen(error.what()) +
-                                   u"); nothing was imported",
-                               0, 0});
+    found.push_back(Diagnostic{
+        Severity::Error, "behaviour-failed", Text(),
+        u"reading the document failed (" + Widen(error.what()) + u"); nothing was imported", 0, 0});
     return finish(false);
   } catch (...) {
     found.push_back(Diagnostic{Severity::Error, "behaviour-failed", Text(),
@@ -618,7 +618,8 @@ Json::Object SelectStyles(const Json::Object& document, const std::vector<Text>&
     if (info.names.count(name))
       return;
     const auto renamed = info.renames.find(name);
-    const auto found = members.find((renamed != info.renames.end() ? renamed->second : name).GetView());
+    const auto found =
+        members.find((renamed != info.renames.end() ? renamed->second : name).GetView());
     if (found == members.end())
       return;
     for (const Json::Value* member : found->second)

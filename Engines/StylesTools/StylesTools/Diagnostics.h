@@ -50,9 +50,9 @@ STYLES_TOOLS_API std::vector<Diagnostic> ValidateDocument(const ZelStringT<char1
 // an import into it with `replace` would read it: "inherits" may name the
 // target's styles, parent cycles may run through them, and (without
 // `replace`) names the target holds already are reported as not imported.
-STYLES_TOOLS_API std::vector<Diagnostic>
-ValidateDocument(const Json::Object& document, const StyleSheet* target = nullptr,
-                 bool replace = false);
+STYLES_TOOLS_API std::vector<Diagnostic> ValidateDocument(const Json::Object& document,
+                                                          const StyleSheet* target = nullptr,
+                                                          bool replace = false);
 
 // Imports `text` into `target` all or nothing. The document is validated
 // against the target first; then it is imported into a scratch sheet that

@@ -131,7 +131,9 @@ private:
     Style* const* substyle = value ? value->GetIf<Style*>() : nullptr;
     return substyle ? *substyle : nullptr;
   }
-  static Text Trimmed(const Text& prefix) { return Text(prefix.GetView().substr(0, prefix.GetLength() - 1)); }
+  static Text Trimmed(const Text& prefix) {
+    return Text(prefix.GetView().substr(0, prefix.GetLength() - 1));
+  }
 
   static bool SameValue(const EffectiveValue& a, const EffectiveValue& b) {
     const ZelUtils::Any& valueA = *a.resolution.value;

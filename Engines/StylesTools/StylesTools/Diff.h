@@ -20,10 +20,10 @@ namespace Tools {
 
 struct STYLES_TOOLS_API Difference {
   enum class Kind {
-    Added,          // the style is only in the new sheet
-    Removed,        // the style is only in the old sheet
-    ParentChanged,  // "inherits" differs (path empty, or a substyle's path)
-    ValueChanged,   // an own value was set, cleared or changed
+    Added,           // the style is only in the new sheet
+    Removed,         // the style is only in the old sheet
+    ParentChanged,   // "inherits" differs (path empty, or a substyle's path)
+    ValueChanged,    // an own value was set, cleared or changed
     EffectiveChanged // what the style resolves to changed, its own value not
   };
   Kind kind = Kind::ValueChanged;

@@ -221,7 +221,8 @@ struct SchemaReader {
   static int AsInteger(const Json::Value& value, const Text& pointer, int minimum) {
     const double number = AsNumber(value, pointer);
     if (std::trunc(number) != number || number < minimum || number > INT_MAX)
-      Fail(pointer, u"must be a whole number of at least " + detail::Widen(std::to_string(minimum)));
+      Fail(pointer,
+           u"must be a whole number of at least " + detail::Widen(std::to_string(minimum)));
     return static_cast<int>(number);
   }
   // A non-empty key that can be a property or category name and a path step.
@@ -246,9 +247,9 @@ struct SchemaReader {
 
   static ValueType ReadType(const Json::Value& value, const Text& pointer) {
     static const std::pair<const char16_t*, ValueType> kTypes[] = {
-        {u"number", ValueType::Number},   {u"integer", ValueType::Integer},
-        {u"bool", ValueType::Bool},       {u"text", ValueType::Text},
-        {u"colour", ValueType::Colour},   {u"enum", ValueType::Enum},
+        {u"number", ValueType::Number},     {u"integer", ValueType::Integer},
+        {u"bool", ValueType::Bool},         {u"text", ValueType::Text},
+        {u"colour", ValueType::Colour},     {u"enum", ValueType::Enum},
         {u"substyle", ValueType::Substyle}, {u"array", ValueType::Array}};
     const Text& text = AsText(value, pointer);
     for (const auto& [name, type] : kTypes)
@@ -434,10 +435,10 @@ struct SchemaReader {
         const PropertySchema& property = category.properties[j];
         if ((property.type == ValueType::Substyle || property.type == ValueType::Array) &&
             !schema.FindCategory(property.elementCategory))
-          Fail(AppendPointer(AppendPointer(AppendPointer(AppendPointer(Text(u"/categories"), i),
-                                                         u"properties"),
-                                           j),
-                             u"category"),
+          Fail(AppendPointer(
+                   AppendPointer(
+                       AppendPointer(AppendPointer(Text(u"/categories"), i), u"properties"), j),
+                   u"category"),
                u"names a category the schema does not declare");
       }
     }
@@ -497,9 +498,9 @@ bool RegisterSchema(const Schema& schema, SchemaRegistration& registration, Sche
     const CategorySchema& category = schema.categories[i];
     const Text pointer = AppendPointer(Text(u"/categories"), i);
     if (manager.FindCategory(category.key)) {
-      error = SchemaError{AppendPointer(pointer, u"key"),
-                          u"category " + Quoted(category.key.GetString()) +
-                              u" is already registered"};
+      error =
+          SchemaError{AppendPointer(pointer, u"key"),
+                      u"category " + Quoted(category.key.GetString()) + u" is already registered"};
       return false;
     }
     styleSubstyles = styleSubstyles || category.styleSubstyle;
