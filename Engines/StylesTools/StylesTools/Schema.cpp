@@ -520,7 +520,9 @@ bool RegisterSchema(const Schema& schema, SchemaRegistration& registration, Sche
     for (const PropertySchema& property : category.properties) {
       std::unique_ptr<BaseStyleProperty> behaviour(CreateBehaviour(property));
       manager.RegisterProperty(category.key, property.key, behaviour.get());
-      behaviour.release();
+      // A key listed twice (a schema built in code) keeps the first behaviour.
+      if (manager.GetStyleProperty(category.key, property.key) == behaviour.get())
+        behaviour.release();
     }
   }
   if (styleSubstyles) {
