@@ -598,17 +598,21 @@ bool ImportChecked(StyleSheet& target, Json::Object& document, bool replace,
 
 Json::Object SelectStyles(const Json::Object& document, const std::vector<Text>& names) {
   StyleManager& manager = GetStyleManager();
-  // Every style member of a registered category, by name ignoring case.
-  std::map<std::u16string_view, std::vector<const Json::Value*>,
-           ZelUtils::String::LessThanCaseInsensitive>
-      members;
+  // Every style member of a registered category, sorted by name ignoring
+  // case (one block, not a node per name: documents may be large).
+  using Entry = std::pair<std::u16string_view, const Json::Value*>;
+  std::vector<Entry> members;
   for (std::size_t i = 0; i < document.GetSize(); ++i) {
     const Json::Object* category = document.GetValue(i).GetIf<Json::Object>();
     if (!category || !manager.CategoryExists(document.GetValueName(i)))
       continue;
     for (std::size_t j = 0; j < category->GetSize(); ++j)
-      members[category->GetValueName(j).GetView()].push_back(&category->GetValue(j));
+      members.emplace_back(category->GetValueName(j).GetView(), &category->GetValue(j));
   }
+  const auto byName = [](const Entry& a, const Entry& b) {
+    return ZelUtils::String::LessThanCaseInsensitive()(a.first, b.first);
+  };
+  std::stable_sort(members.begin(), members.end(), byName);
 
   // The names needed, found by following every "inherits" at any depth.
   const WImportStyleInfo& info = manager.GetImportStyleInfo();
@@ -618,13 +622,11 @@ Json::Object SelectStyles(const Json::Object& document, const std::vector<Text>&
     if (info.names.count(name))
       return;
     const auto renamed = info.renames.find(name);
-    const auto found =
-        members.find((renamed != info.renames.end() ? renamed->second : name).GetView());
-    if (found == members.end())
-      return;
-    for (const Json::Value* member : found->second)
-      if (selected.insert(member).second)
-        pending.push_back(member);
+    const Entry key((renamed != info.renames.end() ? renamed->second : name).GetView(), nullptr);
+    const auto [first, last] = std::equal_range(members.begin(), members.end(), key, byName);
+    for (auto member = first; member != last; ++member)
+      if (selected.insert(member->second).second)
+        pending.push_back(member->second);
   };
   for (const Text& name : names)
     need(name);
