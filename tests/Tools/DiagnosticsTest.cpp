@@ -196,6 +196,21 @@ TEST_F(DiagnosticsTest, AFailedImportLeavesTheTargetExactlyAsItWas) {
   EXPECT_EQ(Exported(target), before);
 }
 
+// Every parent, of a style or of a substyle, is a style of `sheet`, and every
+// single substyle names its holder as owner: nothing points into the scratch
+// sheet that the checked import used.
+void ExpectSoundLinks(const StyleSheet& sheet, const Style& style) {
+  if (style.GetParent()) {
+    EXPECT_FALSE(sheet.GetStyleName(style.GetParent()).IsEmpty());
+  }
+  for (const auto& entry : style.GetProperties()) {
+    if (Style* const* substyle = entry.second.GetIf<Style*>(); substyle && *substyle) {
+      EXPECT_EQ((*substyle)->GetOwner(), &style);
+      ExpectSoundLinks(sheet, **substyle);
+    }
+  }
+}
+
 // A random document over a few names in varying letter case, so that
 // replacements, clashes, parents in the target and cycles all occur.
 std::string RandomDocument(std::mt19937& random) {
@@ -256,6 +271,8 @@ TEST_F(DiagnosticsTest, ACheckedImportGivesWhatThePlainImportGives) {
     ++imported;
     ASSERT_TRUE(plain.ImportFromString(U16(document), replace));
     EXPECT_EQ(Exported(checked), Exported(plain));
+    for (const Style* style : checked.GetStyles())
+      ExpectSoundLinks(checked, *style);
     EXPECT_EQ(checked.GetVersion(), plain.GetVersion());
     EXPECT_EQ(checked.GetExternalID(), plain.GetExternalID());
     // Target styles that were not replaced are the same objects as before.
