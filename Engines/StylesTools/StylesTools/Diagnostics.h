@@ -23,6 +23,8 @@ namespace Tools {
 
 enum class Severity { Error, Warning };
 
+// An error means that a plain import fails or reads the document otherwise
+// than it is written; a warning, that something is skipped or adjusted.
 // Codes, stable across versions (tools match on them):
 //   errors:   invalid-json, not-an-object, style-not-object, wrong-kind,
 //             bad-value, type-rejected, missing-parent, inheritance-cycle,
@@ -43,8 +45,10 @@ struct STYLES_TOOLS_API Diagnostic {
 
 STYLES_TOOLS_API bool HasErrors(const std::vector<Diagnostic>& diagnostics);
 
-// Every problem of the document `text`, in document order. Names that
-// "inherits" uses resolve among the document's own styles.
+// Every problem of the document `text`: those of the sheet's members and
+// style names first, then those inside each style in document order, then
+// parent cycles. Names that "inherits" uses resolve among the document's own
+// styles.
 STYLES_TOOLS_API std::vector<Diagnostic> ValidateDocument(const ZelStringT<char16_t>& text);
 // The same for a parsed document. With a `target`, the document is checked as
 // an import into it with `replace` would read it: "inherits" may name the
