@@ -8,7 +8,7 @@ WERROR         ?= OFF
 PREFIX         ?= /usr/local
 
 # Debian packages the build needs.
-PACKAGES := cmake make g++ pkg-config rapidjson-dev libicu-dev libgtest-dev libbenchmark-dev
+PACKAGES := cmake make g++ pkg-config rapidjson-dev libicu-dev libgtest-dev libbenchmark-dev libcli11-dev
 
 CMAKE_FLAGS := -DCMAKE_BUILD_TYPE=$(BUILD_TYPE) -DSTYLES_WARNINGS_AS_ERRORS=$(WERROR)
 

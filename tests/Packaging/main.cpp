@@ -1,6 +1,8 @@
-// The README's first example; exits non-zero when it does not print what the
-// README says.
+// The README's first example, and a schema of the toolkit validating a
+// document; exits non-zero when either does not give what the README says.
 #include <Styles/Styles.h>
+#include <StylesTools/Diagnostics.h>
+#include <StylesTools/Schema.h>
 
 #include <cstdio>
 
@@ -31,7 +33,20 @@ int main() {
   ZelStringT<char16_t> json;
   sheet.ExportToString(json, false);
 
-  const bool ok = size == 11.0 && path.size() == 2 &&
+  Tools::Schema schema;
+  Tools::SchemaRegistration registration;
+  Tools::SchemaError error;
+  const bool registered =
+      Tools::ParseSchema(u"{\"categories\": [{\"key\": \"note\", \"properties\": "
+                         u"[{\"key\": \"size\", \"type\": \"number\", \"minimum\": 1}]}]}",
+                         schema, error) &&
+      Tools::RegisterSchema(schema, registration, error);
+  const bool checked =
+      registered &&
+      Tools::ValidateDocument(u"{\"note\": {\"N\": {\"size\": \"0\"}}}").size() == 1;
+  Tools::DeregisterSchema(registration);
+
+  const bool ok = size == 11.0 && path.size() == 2 && checked &&
                   json == u"{\"version\":1,\"paragraph\":{\"Body\":{\"fontSize\":\"11\"}}}";
   std::puts(ok ? "consumer: ok" : "consumer: unexpected result");
   return ok ? 0 : 1;

@@ -1,0 +1,672 @@
+#include <StylesTools/Diagnostics.h>
+
+#include <Internal/ToolsSupport.h>
+
+#include <Styles/StyleCategory.h>
+#include <Styles/StyleManager.h>
+#include <Styles/StyleProperty.h>
+#include <Styles/StyleSheet.h>
+
+#include <Json/Json.h>
+#include <ZelPref/ConversionPolicy.h>
+#include <ZelUtils/String.h>
+
+#include <algorithm>
+#include <climits>
+#include <cmath>
+#include <cstdlib>
+#include <exception>
+#include <map>
+#include <memory>
+#include <string>
+#include <tuple>
+#include <unordered_map>
+#include <unordered_set>
+#include <utility>
+
+namespace Styles {
+namespace Tools {
+
+using detail::AppendPointer;
+using detail::Quoted;
+using detail::Text;
+using detail::Widen;
+
+namespace {
+
+constexpr char16_t kVersion[] = u"version";
+constexpr char16_t kExternalID[] = u"id";
+constexpr char16_t kInherits[] = u"inherits";
+constexpr char16_t kExternalName[] = u"original";
+constexpr std::size_t kNone = ~std::size_t(0);
+
+// The names whose unreadable values a plain import replaces instead of failing.
+bool IsRepairedName(const Text& name) {
+  return name == u"xScale" || name == u"yScale" || name == u"angle" || name == u"skew";
+}
+
+// The document's version as the import reads it: truncated, clamped to int.
+int TruncateVersion(double number) {
+  if (std::isnan(number))
+    return 0;
+  const double truncated = std::trunc(number);
+  if (truncated <= static_cast<double>(INT_MIN))
+    return INT_MIN;
+  if (truncated >= static_cast<double>(INT_MAX))
+    return INT_MAX;
+  return static_cast<int>(truncated);
+}
+
+// Line and column (from 1) of a UTF-16 offset, columns in characters.
+std::pair<int, int> LineAndColumn(const Text& text, std::size_t offset) {
+  int line = 1, column = 1;
+  const std::size_t end = std::min(offset, text.GetLength());
+  for (std::size_t i = 0; i < end; ++i) {
+    const char16_t c = text[i];
+    if (c == u'\n') {
+      ++line;
+      column = 1;
+    } else if (c < 0xDC00 || c > 0xDFFF || i == 0 || text[i - 1] < 0xD800 || text[i - 1] > 0xDBFF) {
+      ++column; // the second half of a surrogate pair is not a character of its own
+    }
+  }
+  return {line, column};
+}
+
+// The offset the parser's message ends with ("... at offset N"), if any.
+bool ParseErrorOffset(const Text& message, std::size_t& offset) {
+  static constexpr std::u16string_view kMarker = u" at offset ";
+  const std::size_t at = message.GetView().rfind(kMarker);
+  if (at == std::u16string_view::npos)
+    return false;
+  std::size_t value = 0;
+  std::size_t i = at + kMarker.size();
+  if (i == message.GetLength())
+    return false;
+  for (; i < message.GetLength(); ++i) {
+    const char16_t c = message[i];
+    if (c < u'0' || c > u'9' || value > (kNone - 9) / 10)
+      return false;
+    value = value * 10 + static_cast<std::size_t>(c - u'0');
+  }
+  offset = value;
+  return true;
+}
+
+// A JSON Pointer that is spelt out only when a diagnostic needs it: each
+// level holds its token and the level above, on the stack of the walk.
+struct Where {
+  const Where* up;
+  const Text* name; // the member's name, or null for an array index
+  std::size_t index = 0;
+
+  Text Spell() const {
+    std::vector<const Where*> levels;
+    for (const Where* level = this; level; level = level->up)
+      levels.push_back(level);
+    Text pointer;
+    for (auto level = levels.rbegin(); level != levels.rend(); ++level)
+      pointer = (*level)->name ? AppendPointer(pointer, (*level)->name->GetView())
+                               : AppendPointer(pointer, (*level)->index);
+    return pointer;
+  }
+};
+
+const Text kInheritsName(kInherits);
+
+class Validator {
+public:
+  Validator(const StyleSheet* target, bool replace)
+      : m_manager(GetStyleManager()), m_target(target), m_replace(replace) {}
+
+  std::vector<Diagnostic> Run(const Json::Object& document) {
+    CollectStyles(document);
+    const int current = m_manager.GetCurrentVersion();
+    if (m_versionSeen && current >= 0 && m_documentVersion > current)
+      Add(Severity::Warning, "version-too-new", u"/version",
+          u"the document's version " + Widen(std::to_string(m_documentVersion)) +
+              u" is newer than the current version " + Widen(std::to_string(current)));
+    for (m_current = 0; m_current < m_styles.size(); ++m_current) {
+      const DocumentStyle& style = m_styles[m_current];
+      const Where category{nullptr, style.categoryName};
+      const Where where{&category, style.name};
+      CheckStyle(*style.object, style.category, where, style.node);
+    }
+    FindCycles();
+    return std::move(m_diagnostics);
+  }
+
+private:
+  struct DocumentStyle {
+    const Text* categoryName;
+    const Text* name;
+    PropertyKey category;
+    const Json::Object* object;
+    std::size_t node;
+  };
+  // A style an "inherits" can name: one of the document (first member of
+  // that name) or of the target. A target style's parent edge is resolved on
+  // demand.
+  struct Node {
+    PropertyKey category;
+    const Style* targetStyle = nullptr;
+    std::size_t parent = kNone;
+    bool parentKnown = false;
+    std::size_t edgeStyle = kNone; // the document style whose "inherits" made the edge
+  };
+  // Case-insensitive names of the document, viewing the parsed text.
+  using NameMap =
+      std::map<std::u16string_view, std::size_t, ZelUtils::String::LessThanCaseInsensitive>;
+
+  void Add(Severity severity, const char* code, const Text& pointer, const Text& message) {
+    m_diagnostics.push_back(Diagnostic{severity, code, pointer, message, 0, 0});
+  }
+  void Add(Severity severity, const char* code, const Where& where, const Text& message) {
+    Add(severity, code, where.Spell(), message);
+  }
+
+  void CollectStyles(const Json::Object& document) {
+    for (std::size_t i = 0; i < document.GetSize(); ++i) {
+      const Text& name = document.GetValueName(i);
+      const Json::Value& value = document.GetValue(i);
+      const Where where{nullptr, &name};
+      const Json::Object* category = value.GetIf<Json::Object>();
+      if (!category) {
+        CheckSheetMember(name, value, where);
+        continue;
+      }
+      if (!m_manager.CategoryExists(name)) {
+        Add(Severity::Warning, "unknown-category", where,
+            u"category " + Quoted(name) + u" is not registered; its styles are skipped");
+        continue;
+      }
+      const PropertyKey categoryKey(name);
+      m_styles.reserve(m_styles.size() + category->GetSize());
+      m_nodes.reserve(m_nodes.size() + category->GetSize());
+      for (std::size_t j = 0; j < category->GetSize(); ++j) {
+        const Text& styleName = category->GetValueName(j);
+        const Where styleWhere{&where, &styleName};
+        const Json::Object* object = category->GetValue(j).GetIf<Json::Object>();
+        if (!object) {
+          Add(Severity::Error, "style-not-object", styleWhere,
+              u"style " + Quoted(styleName) + u" must be an object");
+          continue;
+        }
+        m_styles.push_back(DocumentStyle{&name, &styleName, categoryKey, object,
+                                         AddName(styleName, styleWhere, categoryKey)});
+      }
+    }
+  }
+
+  void CheckSheetMember(const Text& name, const Json::Value& value, const Where& where) {
+    if (name == kVersion) {
+      if (const double* number = value.GetIf<double>()) {
+        m_documentVersion = TruncateVersion(*number);
+        m_versionSeen = true;
+      } else {
+        Add(Severity::Error, "wrong-kind", where, u"the version must be a number");
+      }
+    } else if (name == kExternalID) {
+      if (!value.Is<Text>())
+        Add(Severity::Error, "wrong-kind", where, u"the sheet's id must be a string");
+    } else {
+      Add(Severity::Warning, "unknown-member", where,
+          u"member " + Quoted(name) + u" is neither a category, the version nor the id");
+    }
+  }
+
+  // The node of a document style name, reporting a name used twice.
+  std::size_t AddName(const Text& name, const Where& where, const PropertyKey& category) {
+    const auto [found, added] = m_documentNames.emplace(name.GetView(), m_nodes.size());
+    if (!added) {
+      const Text first(found->first);
+      Add(Severity::Error, "duplicate-name", where,
+          first == name
+              ? u"style " + Quoted(name) + u" appears twice in the document"
+              : u"style " + Quoted(name) + u" differs only in letter case from " + Quoted(first));
+      m_nodes[found->second].category = category; // the last reading wins
+      return found->second;
+    }
+    m_nodes.push_back(Node{category, nullptr, kNone, true, kNone});
+    if (m_target && !m_replace && m_target->GetStyle(name))
+      Add(Severity::Warning, "name-taken", where,
+          u"the sheet already has a style " + Quoted(name) + u"; the document's is not imported");
+    return found->second;
+  }
+
+  // The style a parent name stands for, as the import resolves it.
+  std::size_t Resolve(const Text& name) {
+    const Style* targetStyle = m_target ? m_target->GetStyle(name) : nullptr;
+    const auto documentNode = m_documentNames.find(name.GetView());
+    if (documentNode != m_documentNames.end() && (!targetStyle || m_replace))
+      return documentNode->second;
+    if (!targetStyle)
+      return kNone;
+    const auto known = m_targetNodes.find(targetStyle);
+    if (known != m_targetNodes.end())
+      return known->second;
+    const std::size_t node = m_nodes.size();
+    m_nodes.push_back(Node{targetStyle->GetCategoryName(), targetStyle, kNone, false, kNone});
+    m_targetNodes.emplace(targetStyle, node);
+    return node;
+  }
+
+  std::size_t Parent(std::size_t node) {
+    if (!m_nodes[node].parentKnown) {
+      m_nodes[node].parentKnown = true;
+      // A target style keeps a parent of the target; one replaced by the
+      // document is followed by the document's style of that name.
+      const Style* parent = m_nodes[node].targetStyle->GetParent();
+      const Text parentName = m_target->GetStyleName(parent);
+      const std::size_t parentNode = parentName.IsEmpty() ? kNone : Resolve(parentName);
+      m_nodes[node].parent = parentNode;
+    }
+    return m_nodes[node].parent;
+  }
+
+  void CheckStyle(const Json::Object& object, const PropertyKey& categoryKey, const Where& where,
+                  std::size_t node) {
+    const std::shared_ptr<StyleCategory>* category = m_manager.FindCategory(categoryKey);
+    if (!category) {
+      Add(Severity::Warning, "unknown-category", where,
+          u"category " + Quoted(categoryKey.GetString()) +
+              u" is not registered; the substyle is read empty");
+      return;
+    }
+    for (std::size_t i = 0; i < object.GetSize(); ++i) {
+      const Text& name = object.GetValueName(i);
+      const Json::Value& value = object.GetValue(i);
+      const Where member{&where, &name};
+      if (name == kInherits) {
+        CheckInherits(value, categoryKey, member, node);
+      } else if (name == kExternalID || name == kExternalName) {
+        if (!value.Is<Text>())
+          Add(Severity::Error, "wrong-kind", member, Quoted(name) + u" must be a string");
+      } else {
+        const std::optional<PropertyKey> key = PropertyKey::Find(name.GetView());
+        const BaseStyleProperty* behaviour = key ? (*category)->GetStyleProperty(*key) : nullptr;
+        if (!behaviour) {
+          Add(Severity::Warning, "unknown-property", member,
+              u"property " + Quoted(name) + u" is not registered in category " +
+                  Quoted(categoryKey.GetString()) + u"; it is skipped");
+          continue;
+        }
+        if (behaviour->IsDeprecated())
+          Add(Severity::Warning, "deprecated-property", member,
+              u"property " + Quoted(name) + u" is deprecated");
+        if (behaviour->GetMinimumVersion() > m_documentVersion)
+          Add(Severity::Warning, "property-too-new", member,
+              u"property " + Quoted(name) + u" needs version " +
+                  Widen(std::to_string(behaviour->GetMinimumVersion())) +
+                  u", newer than the document's");
+        CheckValue(*behaviour, name, value, member);
+      }
+    }
+  }
+
+  void CheckInherits(const Json::Value& value, const PropertyKey& categoryKey, const Where& where,
+                     std::size_t node) {
+    const Text* name = value.GetIf<Text>();
+    if (!name) {
+      Add(Severity::Error, "wrong-kind", where, u"\"inherits\" must be a string");
+      return;
+    }
+    if (name->IsEmpty())
+      return;
+    const WImportStyleInfo& info = m_manager.GetImportStyleInfo();
+    if (!info.names.empty() && info.names.count(*name))
+      return; // the host asked for this name to be left alone
+    const auto renamed = info.renames.empty() ? info.renames.end() : info.renames.find(*name);
+    const Text& parentName = renamed != info.renames.end() ? renamed->second : *name;
+    const std::size_t parent = Resolve(parentName);
+    if (parent == kNone) {
+      Add(Severity::Error, "missing-parent", where,
+          u"no style " + Quoted(parentName) + u" to inherit from");
+      return;
+    }
+    if (m_nodes[parent].category != categoryKey)
+      Add(Severity::Error, "parent-category", where,
+          u"parent " + Quoted(parentName) + u" is of category " +
+              Quoted(m_nodes[parent].category.GetString()) + u", not " +
+              Quoted(categoryKey.GetString()));
+    if (node != kNone) {
+      m_nodes[node].parent = parent;
+      m_nodes[node].edgeStyle = m_current;
+    }
+  }
+
+  void CheckValue(const BaseStyleProperty& behaviour, const Text& name, const Json::Value& value,
+                  const Where& where) {
+    if (dynamic_cast<const StyleSetProperty*>(&behaviour)) {
+      if (const Json::Object* object = value.GetIf<Json::Object>())
+        CheckStyle(*object, behaviour.GetElementCategoryName(), where, kNone);
+      else if (!value.IsNull())
+        Add(Severity::Error, "wrong-kind", where,
+            u"substyle " + Quoted(name) + u" must be an object or null");
+      return;
+    }
+    if (dynamic_cast<const StyleArrayProperty*>(&behaviour)) {
+      const Json::Array* array = value.GetIf<Json::Array>();
+      if (!array) {
+        Add(Severity::Error, "wrong-kind", where,
+            u"array " + Quoted(name) + u" must be an array of objects");
+        return;
+      }
+      PropertyKey element = behaviour.GetElementCategoryName();
+      if (element == PropertyKey::Empty)
+        element = behaviour.GetCategoryKey();
+      for (std::size_t i = 0; i < array->GetSize(); ++i) {
+        const Where elementWhere{&where, nullptr, i};
+        if (const Json::Object* object = array->GetValue(i).GetIf<Json::Object>())
+          CheckStyle(*object, element, elementWhere, kNone);
+        else
+          Add(Severity::Error, "wrong-kind", elementWhere,
+              u"an element of " + Quoted(name) + u" must be an object");
+      }
+      return;
+    }
+    const ZelPref::ConversionPolicy* policy = behaviour.GetConversionPolicy();
+    if (!policy)
+      return; // nothing a host's own behaviour reads can be checked here
+    Text text;
+    if (const Text* string = value.GetIf<Text>()) {
+      text = *string;
+    } else if (const double* number = value.GetIf<double>()) {
+      // The import reads numbers as "%g" text, which keeps six digits.
+      text = Text::FormatInternal("%g", *number);
+      const std::string ascii(text.begin(), text.end());
+      if (std::strtod(ascii.c_str(), nullptr) != *number)
+        Add(Severity::Warning, "number-rounded", where,
+            u"the number is read as " + text + u"; write it as a string to keep every digit");
+    } else if (const bool* flag = value.GetIf<bool>()) {
+      text = *flag ? u"1" : u"0";
+    } else {
+      Add(Severity::Error, "wrong-kind", where,
+          u"property " + Quoted(name) + u" must be a string, a number or true or false");
+      return;
+    }
+    try {
+      const ZelUtils::Any converted = policy->FromText(text);
+      if (!behaviour.CheckType(converted))
+        Add(Severity::Error, "type-rejected", where,
+            Quoted(text) + u" is not an allowed value of " + Quoted(name));
+    } catch (const std::exception&) {
+      if (IsRepairedName(name))
+        Add(Severity::Warning, "value-replaced", where,
+            Quoted(text) + u" cannot be read; the import stores the neutral value instead");
+      else
+        Add(Severity::Error, "bad-value", where,
+            Quoted(text) + u" cannot be read as a value of " + Quoted(name));
+    }
+  }
+
+  // Reports every "inherits" that closes a parent cycle. Each style has one
+  // parent, so one walk per style that stops at styles already seen finds
+  // every cycle in linear time.
+  void FindCycles() {
+    std::vector<unsigned char> state(m_nodes.size(), 0); // 0 new, 1 on the walk, 2 done
+    std::vector<std::size_t> walk, closing;
+    for (std::size_t start = 0; start < m_nodes.size(); ++start) {
+      walk.clear();
+      std::size_t node = start;
+      while (node != kNone && state[node] == 0) {
+        state[node] = 1;
+        walk.push_back(node);
+        node = m_nodes[node].targetStyle ? Parent(node) : m_nodes[node].parent;
+        if (state.size() < m_nodes.size())
+          state.resize(m_nodes.size(), 0);
+      }
+      if (node != kNone && state[node] == 1)
+        for (auto it = std::find(walk.begin(), walk.end(), node); it != walk.end(); ++it)
+          if (m_nodes[*it].edgeStyle != kNone)
+            closing.push_back(m_nodes[*it].edgeStyle);
+      for (const std::size_t visited : walk)
+        state[visited] = 2;
+    }
+    // In document order, like the other diagnostics.
+    std::sort(closing.begin(), closing.end());
+    for (const std::size_t edge : closing) {
+      const Where category{nullptr, m_styles[edge].categoryName};
+      const Where style{&category, m_styles[edge].name};
+      Add(Severity::Error, "inheritance-cycle", Where{&style, &kInheritsName},
+          u"this parent would make the style inherit from itself; the import ignores it");
+    }
+  }
+
+  StyleManager& m_manager;
+  const StyleSheet* m_target;
+  bool m_replace;
+  int m_documentVersion = 0;
+  bool m_versionSeen = false;
+  std::vector<DocumentStyle> m_styles;
+  std::size_t m_current = kNone; // the document style being checked
+  std::vector<Node> m_nodes;
+  NameMap m_documentNames;
+  std::unordered_map<const Style*, std::size_t> m_targetNodes;
+  std::vector<Diagnostic> m_diagnostics;
+};
+
+// Parses `text`; on failure `diagnostics` gets why and null is returned.
+Json::Object* ParseDocument(const Text& text, Json::Value& value,
+                            std::vector<Diagnostic>& diagnostics) {
+  Text errorText;
+  if (!Json::Parse(text, value, errorText)) {
+    Diagnostic diagnostic{Severity::Error, "invalid-json", Text(), u"not JSON: " + errorText, 0, 0};
+    std::size_t offset = 0;
+    if (ParseErrorOffset(errorText, offset))
+      std::tie(diagnostic.line, diagnostic.column) = LineAndColumn(text, offset);
+    diagnostics.push_back(std::move(diagnostic));
+    return nullptr;
+  }
+  Json::Object* document = value.GetIf<Json::Object>();
+  if (!document)
+    diagnostics.push_back(Diagnostic{Severity::Error, "not-an-object", Text(),
+                                     u"a sheet document is a JSON object", 0, 0});
+  return document;
+}
+
+// Marks the stand-ins of target styles in the scratch sheet. No document can
+// give a style this external name: JSON text cannot hold an unpaired surrogate.
+const Text& StandInMark() {
+  static const Text mark(std::u16string(1, char16_t(0xD800)) + u"stand-in");
+  return mark;
+}
+
+} // namespace
+
+bool HasErrors(const std::vector<Diagnostic>& diagnostics) {
+  return std::any_of(diagnostics.begin(), diagnostics.end(),
+                     [](const Diagnostic& d) { return d.severity == Severity::Error; });
+}
+
+std::vector<Diagnostic> ValidateDocument(const Text& text) {
+  std::vector<Diagnostic> diagnostics;
+  Json::Value value;
+  if (const Json::Object* document = ParseDocument(text, value, diagnostics))
+    return ValidateDocument(*document);
+  return diagnostics;
+}
+
+std::vector<Diagnostic> ValidateDocument(const Json::Object& document, const StyleSheet* target,
+                                         bool replace) {
+  return Validator(target, replace).Run(document);
+}
+
+bool ImportChecked(StyleSheet& target, const Text& text, bool replace,
+                   std::vector<Diagnostic>* diagnostics) {
+  std::vector<Diagnostic> found;
+  Json::Value value;
+  if (Json::Object* document = ParseDocument(text, value, found))
+    return ImportChecked(target, *document, replace, diagnostics);
+  if (diagnostics)
+    *diagnostics = std::move(found);
+  return false;
+}
+
+bool ImportChecked(StyleSheet& target, Json::Object& document, bool replace,
+                   std::vector<Diagnostic>* diagnostics) {
+  std::vector<Diagnostic> found;
+  const auto finish = [&](bool imported) {
+    if (diagnostics)
+      *diagnostics = std::move(found);
+    return imported;
+  };
+  found = ValidateDocument(document, &target, replace);
+  if (HasErrors(found))
+    return finish(false);
+
+  // The scratch sheet starts as an image of the target: one empty stand-in
+  // per target style, under its name and category, linked as the originals.
+  StyleSheet scratch;
+  scratch.SetVersion(target.GetVersion());
+  scratch.SetExternalID(target.GetExternalID());
+  std::unordered_map<const Style*, Style*> standIns;
+  std::unordered_set<const Style*> standInSet;
+  for (const Text& name : target.GetStyleNames()) {
+    const Style* original = target.GetStyle(name);
+    Style* standIn =
+        new Style(nullptr, original ? original->GetCategoryName() : PropertyKey::Empty);
+    standIn->SetExternalName(StandInMark());
+    standIns.emplace(original, standIn);
+    standInSet.insert(standIn);
+    scratch.AddStyle(name, standIn, false);
+  }
+  for (const auto& [original, standIn] : standIns)
+    if (original && original->GetParent()) {
+      const auto parent = standIns.find(original->GetParent());
+      if (parent != standIns.end())
+        standIn->SetParent(parent->second);
+    }
+
+  try {
+    scratch.ImportJson(&document, replace);
+  } catch (const std::exception& error) {
+    found.push_back(Diagnostic{
+        Severity::Error, "behaviour-failed", Text(),
+        u"reading the document failed (" + Widen(error.what()) + u"); nothing was imported", 0, 0});
+    return finish(false);
+  } catch (...) {
+    found.push_back(Diagnostic{Severity::Error, "behaviour-failed", Text(),
+                               u"reading the document failed; nothing was imported", 0, 0});
+    return finish(false);
+  }
+
+  // Stand-ins still in the scratch sheet map back to their originals; the
+  // other styles are the import's. A replaced stand-in was destroyed, and its
+  // address may have been reused by a new style, hence the mark.
+  std::map<Style*, Style*> toOriginals;
+  std::vector<std::pair<Text, Style*>> created;
+  const std::vector<Text> names = scratch.GetStyleNames();
+  const std::vector<Style*> styles = scratch.GetStyles(); // the same order
+  for (std::size_t i = 0; i < names.size(); ++i) {
+    Style* style = styles[i];
+    if (style && standInSet.count(style) && style->GetExternalName() == StandInMark())
+      toOriginals.emplace(style, target.GetStyle(names[i]));
+    else
+      created.emplace_back(names[i], style);
+  }
+  for (auto& [name, style] : created) {
+    scratch.RemoveStyle(style);
+    if (style && !toOriginals.empty())
+      style->RemapDependency(toOriginals);
+  }
+
+  // Into the target, as the import's first pass would file them: a replaced
+  // style leaves, and every target style that referred to it refers to its
+  // successor.
+  std::map<Style*, Style*> successors;
+  for (auto& [name, style] : created) {
+    if (replace)
+      if (Style* previous = target.RemoveStyle(name))
+        successors.emplace(previous, style);
+    target.AddStyle(name, style, false);
+  }
+  if (!successors.empty()) {
+    std::unordered_set<const Style*> createdSet;
+    for (const auto& entry : created)
+      createdSet.insert(entry.second);
+    for (Style* style : target.GetStyles())
+      if (style && !createdSet.count(style))
+        style->RemapDependency(successors);
+    for (const auto& entry : successors)
+      delete entry.first;
+  }
+  target.SetVersion(scratch.GetVersion());
+  target.SetExternalID(scratch.GetExternalID());
+  return finish(true);
+}
+
+Json::Object SelectStyles(const Json::Object& document, const std::vector<Text>& names) {
+  StyleManager& manager = GetStyleManager();
+  // Every style member of a registered category, sorted by name ignoring
+  // case (one block, not a node per name: documents may be large).
+  using Entry = std::pair<std::u16string_view, const Json::Value*>;
+  std::vector<Entry> members;
+  for (std::size_t i = 0; i < document.GetSize(); ++i) {
+    const Json::Object* category = document.GetValue(i).GetIf<Json::Object>();
+    if (!category || !manager.CategoryExists(document.GetValueName(i)))
+      continue;
+    for (std::size_t j = 0; j < category->GetSize(); ++j)
+      members.emplace_back(category->GetValueName(j).GetView(), &category->GetValue(j));
+  }
+  const auto byName = [](const Entry& a, const Entry& b) {
+    return ZelUtils::String::LessThanCaseInsensitive()(a.first, b.first);
+  };
+  std::stable_sort(members.begin(), members.end(), byName);
+
+  // The names needed, found by following every "inherits" at any depth.
+  const WImportStyleInfo& info = manager.GetImportStyleInfo();
+  std::unordered_set<const Json::Value*> selected;
+  std::vector<const Json::Value*> pending;
+  const auto need = [&](const Text& name) {
+    if (info.names.count(name))
+      return;
+    const auto renamed = info.renames.find(name);
+    const Entry key((renamed != info.renames.end() ? renamed->second : name).GetView(), nullptr);
+    const auto [first, last] = std::equal_range(members.begin(), members.end(), key, byName);
+    for (auto member = first; member != last; ++member)
+      if (selected.insert(member->second).second)
+        pending.push_back(member->second);
+  };
+  for (const Text& name : names)
+    need(name);
+  while (!pending.empty()) {
+    const Json::Value* value = pending.back();
+    pending.pop_back();
+    if (const Json::Object* object = value->GetIf<Json::Object>()) {
+      for (std::size_t i = 0; i < object->GetSize(); ++i) {
+        const Json::Value& member = object->GetValue(i);
+        if (const Text* parent = member.GetIf<Text>()) {
+          if (object->GetValueName(i) == kInherits)
+            need(*parent);
+        } else if (member.Is<Json::Object>() || member.Is<Json::Array>()) {
+          pending.push_back(&member); // substyles and their lists
+        }
+      }
+    } else if (const Json::Array* array = value->GetIf<Json::Array>()) {
+      for (std::size_t i = 0; i < array->GetSize(); ++i)
+        pending.push_back(&array->GetValue(i));
+    }
+  }
+
+  Json::Object part;
+  for (std::size_t i = 0; i < document.GetSize(); ++i) {
+    const Text& name = document.GetValueName(i);
+    const Json::Value& value = document.GetValue(i);
+    const Json::Object* category = value.GetIf<Json::Object>();
+    if (!category) {
+      part.AddValue(name, value);
+      continue;
+    }
+    Json::Object kept;
+    for (std::size_t j = 0; j < category->GetSize(); ++j)
+      if (selected.count(&category->GetValue(j)))
+        kept.AddValue(category->GetValueName(j), category->GetValue(j));
+    if (!kept.IsEmpty())
+      part.AddValue(name, Json::Value(std::move(kept)));
+  }
+  return part;
+}
+
+} // namespace Tools
+} // namespace Styles

@@ -1,0 +1,89 @@
+# The styles program through CTest: each case runs it on small files and
+# checks its exit status and output. Included from tests/CMakeLists.txt.
+set(STYLES_CLI_FILES ${CMAKE_CURRENT_SOURCE_DIR}/Tools/cli)
+set(STYLES_SAMPLE ${PROJECT_SOURCE_DIR}/examples/sample-sheet.json)
+
+# styles_command_test(NAME STATUS ARGS... [OUTPUT re] [ERROR re] [SAME_AS file]
+#                     [INPUT file] [WORK_DIR dir])
+function(styles_command_test name status)
+  cmake_parse_arguments(PARSE_ARGV 2 check "" "OUTPUT;ERROR;SAME_AS;INPUT;WORK_DIR" "")
+  string(JOIN "|" arguments ${check_UNPARSED_ARGUMENTS})
+  set(definitions -DPROGRAM=$<TARGET_FILE:styles> "-DARGS=${arguments}" -DSTATUS=${status})
+  foreach(option OUTPUT ERROR SAME_AS INPUT WORK_DIR)
+    if(DEFINED check_${option})
+      list(APPEND definitions "-D${option}=${check_${option}}")
+    endif()
+  endforeach()
+  add_test(NAME StylesCommand.${name}
+    COMMAND ${CMAKE_COMMAND} ${definitions} -P ${CMAKE_CURRENT_SOURCE_DIR}/Tools/RunStyles.cmake)
+endfunction()
+
+styles_command_test(Help 0 --help OUTPUT "validate.*list.*show.*flatten.*diff.*format.*preset")
+styles_command_test(UnknownCommand 2 frobnicate ERROR "subcommand")
+styles_command_test(MissingArgument 2 show ${STYLES_SAMPLE})
+
+styles_command_test(ValidateClean 0 validate ${STYLES_SAMPLE} OUTPUT "no problems")
+styles_command_test(ValidateErrors 1 validate ${STYLES_SAMPLE} ${STYLES_CLI_FILES}/broken.json
+  OUTPUT "broken.json: error: /paragraph/Body/spaceAfter: .*\\[bad-value\\].*\\[missing-parent\\]")
+styles_command_test(ValidateJson 1 validate --json ${STYLES_CLI_FILES}/broken.json
+  OUTPUT "\"valid\": false.*\"code\": \"bad-value\".*\"pointer\": \"/paragraph/Body/spaceAfter\"")
+styles_command_test(ValidateNotJson 1 validate ${STYLES_CLI_FILES}/notjson.json
+  OUTPUT "notjson.json:2:3: error: .*\\[invalid-json\\]")
+styles_command_test(ValidateStandardInput 0 validate - INPUT ${STYLES_SAMPLE} OUTPUT "<stdin>: no problems")
+styles_command_test(ValidateUnreadable 3 validate ${STYLES_CLI_FILES}/absent.json
+  ERROR "absent.json: cannot be read")
+styles_command_test(ValidateCycle 1 validate ${STYLES_CLI_FILES}/cycle.json
+  OUTPUT "/paragraph/A/inherits.*/paragraph/B/inherits.*/paragraph/C/inherits")
+
+styles_command_test(ShowExplain 0 show ${STYLES_SAMPLE} "Heading 1" --explain
+  SAME_AS ${STYLES_CLI_FILES}/show-heading-1.txt)
+styles_command_test(ShowJson 0 show --json ${STYLES_SAMPLE} "quote"
+  OUTPUT "\"path\": \"character.italic\",[^}]*\"value\": \"1\",[^}]*\"source\": \"ancestor\",[^}]*\"from\": \"Emphasis\"")
+styles_command_test(ShowAstral 0 show ${STYLES_CLI_FILES}/astral.json "𝐀 child" --explain
+  OUTPUT "spaceAfter +2 +from 𝐀 Astral")
+styles_command_test(ShowMissingStyle 1 show ${STYLES_SAMPLE} "No Such Style" ERROR "no style is called")
+styles_command_test(ShowUnusable 4 show ${STYLES_CLI_FILES}/cycle.json A ERROR "inheritance-cycle")
+styles_command_test(ShowNotJson 4 show ${STYLES_CLI_FILES}/notjson.json A ERROR "invalid-json")
+
+styles_command_test(List 0 list ${STYLES_SAMPLE}
+  OUTPUT "paragraph \\(Paragraph\\), 20 styles\n  Normal\n    Body Text\n      Body Text First Indent")
+styles_command_test(ListJson 0 list --json ${STYLES_SAMPLE}
+  OUTPUT "\"name\": \"Chapter Title\",[^}]*\"inherits\": \"Heading 1\",[^}]*\"depth\": 3")
+styles_command_test(Flatten 0 flatten ${STYLES_SAMPLE} "Chapter Title" OUTPUT "\"keepWithNext\": \"1\"")
+styles_command_test(FlattenSubstyle 0 flatten ${STYLES_SAMPLE} "Chapter Title"
+  OUTPUT "\"character\": {[^}]*\"fontName\": \"Avenir Next\"")
+styles_command_test(DiffSame 0 diff ${STYLES_SAMPLE} ${STYLES_SAMPLE})
+styles_command_test(DiffChanged 1 diff --effective ${STYLES_CLI_FILES}/old.json ${STYLES_CLI_FILES}/new.json
+  OUTPUT "paragraph \"Added\": added\nparagraph \"Base\": spaceAfter: 1 -> 2\nparagraph \"body\": spaceAfter \\(effective\\): 1 -> 2\nparagraph \"Gone\": removed\n")
+styles_command_test(Format 0 format --compact ${STYLES_CLI_FILES}/old.json
+  SAME_AS ${STYLES_CLI_FILES}/old-formatted.json)
+
+styles_command_test(CustomSchema 0 show --schema ${STYLES_CLI_FILES}/note-schema.json
+  ${STYLES_CLI_FILES}/notes.json later --explain OUTPUT "text +- +default\n  priority +low +own")
+styles_command_test(MalformedSchema 2 validate --schema ${STYLES_CLI_FILES}/bad-schema.json
+  ${STYLES_SAMPLE} ERROR "bad-schema.json: not a schema: /categories/0/properties/0/type")
+styles_command_test(SchemaContradictsDocument 0 validate --schema ${STYLES_CLI_FILES}/note-schema.json
+  ${STYLES_SAMPLE} OUTPUT "/cell: category \"cell\" is not registered")
+styles_command_test(SchemaLacksTheStyle 1 show --schema ${STYLES_CLI_FILES}/note-schema.json
+  ${STYLES_SAMPLE} "Heading 1" ERROR "no style is called")
+
+# Presets: each step works on the folder the steps before it left.
+set(presets ${CMAKE_CURRENT_BINARY_DIR}/Presets)
+styles_command_test(PresetAdd 0 preset add --folder ${presets} Headings ${STYLES_SAMPLE}
+  "Heading 2" --name "Big Heading" WORK_DIR ${presets} OUTPUT "added preset")
+styles_command_test(PresetAddAgain 1 preset add --folder ${presets} Headings ${STYLES_SAMPLE}
+  "Heading 1" --name "big heading" ERROR "--replace")
+styles_command_test(PresetList 0 preset list --folder ${presets} Headings OUTPUT "^Big Heading\n$")
+styles_command_test(PresetShow 0 preset show --folder ${presets} Headings "big heading"
+  OUTPUT "spaceBefore +18 +own.*character.fontSize +16 +own")
+styles_command_test(PresetDelete 0 preset delete --folder ${presets} Headings "Big Heading")
+styles_command_test(PresetDeleteMissing 1 preset delete --folder ${presets} Headings "Big Heading")
+styles_command_test(PresetNoFolder 3 preset list --folder ${presets}/absent)
+set_tests_properties(StylesCommand.PresetAddAgain PROPERTIES DEPENDS StylesCommand.PresetAdd)
+set_tests_properties(StylesCommand.PresetList PROPERTIES DEPENDS StylesCommand.PresetAddAgain)
+set_tests_properties(StylesCommand.PresetShow PROPERTIES DEPENDS StylesCommand.PresetList)
+set_tests_properties(StylesCommand.PresetDelete PROPERTIES DEPENDS StylesCommand.PresetShow)
+set_tests_properties(StylesCommand.PresetDeleteMissing PROPERTIES DEPENDS StylesCommand.PresetDelete)
+set_tests_properties(StylesCommand.PresetAdd StylesCommand.PresetAddAgain StylesCommand.PresetList
+  StylesCommand.PresetShow StylesCommand.PresetDelete StylesCommand.PresetDeleteMissing
+  PROPERTIES RESOURCE_LOCK StylesPresetFolder)

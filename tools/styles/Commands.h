@@ -1,0 +1,47 @@
+// The commands of the styles program, one function each, over the toolkit.
+// Each returns the process's exit status:
+//   0 success, 1 a negative answer (errors found, differences, no such style
+//   or preset), 2 bad usage (also a malformed schema), 3 a file or folder
+//   that cannot be read, 4 a document whose errors keep it from being used.
+#pragma once
+
+#include "Output.h"
+
+#include <string>
+#include <vector>
+
+namespace StylesCommand {
+
+enum ExitStatus : int { kSuccess = 0, kNegative = 1, kUsage = 2, kUnreadable = 3, kUnusable = 4 };
+
+// Options every command takes.
+struct CommonOptions {
+  std::string schema; // empty: the built-in schema
+  bool json = false;
+};
+
+// Registers the schema for the life of the process's commands; false (with
+// the status in `status`) when it cannot be read or registered.
+bool RegisterSchemaFile(const std::string& path, int& status);
+// Takes out what RegisterSchemaFile registered, once no style is left.
+void DeregisterSchemaFile();
+
+int Validate(const CommonOptions& options, const std::vector<std::string>& documents);
+int List(const CommonOptions& options, const std::string& document);
+int Show(const CommonOptions& options, const std::string& document, const std::string& style,
+         bool explain);
+int Flatten(const CommonOptions& options, const std::string& document, const std::string& style);
+int Diff(const CommonOptions& options, const std::string& oldDocument,
+         const std::string& newDocument, bool effective);
+int Format(const CommonOptions& options, const std::string& document, bool compact);
+
+int PresetList(const CommonOptions& options, const std::string& folder, const std::string& set);
+int PresetShow(const CommonOptions& options, const std::string& folder, const std::string& set,
+               const std::string& name);
+int PresetAdd(const CommonOptions& options, const std::string& folder, const std::string& set,
+              const std::string& document, const std::string& style, const std::string& name,
+              bool replace);
+int PresetDelete(const CommonOptions& options, const std::string& folder, const std::string& set,
+                 const std::string& name);
+
+} // namespace StylesCommand
