@@ -27,6 +27,7 @@
 #include <memory>
 #include <new>
 #include <random>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -367,9 +368,17 @@ class SummaryReporter : public benchmark::ConsoleReporter {
 public:
   void ReportRuns(const std::vector<Run>& runs) override {
     ConsoleReporter::ReportRuns(runs);
-    for (const Run& run : runs)
-      if (run.run_type == Run::RT_Iteration && !run.error_occurred)
-        m_runs[run.benchmark_name()] = run;
+    // With --benchmark_repetitions the medians stand for their benchmarks.
+    for (const Run& run : runs) {
+      if (run.error_occurred)
+        continue;
+      if (run.run_type == Run::RT_Iteration && !m_medians.count(run.run_name.str()))
+        m_runs[run.run_name.str()] = run;
+      else if (run.run_type == Run::RT_Aggregate && run.aggregate_name == "median") {
+        m_runs[run.run_name.str()] = run;
+        m_medians.insert(run.run_name.str());
+      }
+    }
   }
 
   void PrintSummary() const {
@@ -391,7 +400,7 @@ public:
                   Ratio("BM_Export" + large, "BM_Export" + small),
                   Ratio("BM_RapidJsonParse" + large, "BM_RapidJsonParse" + small),
                   Ratio("BM_RapidJsonWrite" + large, "BM_RapidJsonWrite" + small));
-      const Run* memory = Find("BM_ImportMemory" + large);
+      const Run* memory = Find("BM_ImportMemory" + large + "/iterations:1");
       if (memory)
         std::printf("  100k import: peak %.2fx, kept %.2fx the UTF-16 text (goal: 2.5x, 1.5x)\n",
                     double(memory->counters.at("peak_x_text")),
@@ -433,6 +442,7 @@ private:
   }
 
   std::map<std::string, Run> m_runs;
+  std::set<std::string> m_medians;
 };
 
 } // namespace

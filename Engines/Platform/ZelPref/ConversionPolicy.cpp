@@ -4,6 +4,7 @@
 #include <charconv>
 #include <climits>
 #include <cmath>
+#include <cstdint>
 #include <cstdlib>
 #include <cstring>
 #include <string>
@@ -184,7 +185,40 @@ ZelStringT<char16_t> NumberConversionPolicy::ToText(const ZelUtils::Any& value) 
   return Widen(buffer, result.ptr);
 }
 
+// The value of a short plain decimal ("-12.25"): its digits as a whole
+// number below 2^53 divided by a power of ten up to 10^22, both exact, so the
+// one rounding of the division gives the correctly rounded value. False for
+// any other form, which the general reader takes.
+bool ReadShortDecimal(std::u16string_view text, double& value) {
+  constexpr double kPowers[] = {1e0,  1e1,  1e2,  1e3,  1e4,  1e5,  1e6,  1e7,
+                                1e8,  1e9,  1e10, 1e11, 1e12, 1e13, 1e14, 1e15};
+  std::size_t i = 0;
+  const bool negative = !text.empty() && text[0] == u'-';
+  i += negative;
+  std::uint64_t digits = 0;
+  int count = 0, decimals = -1;
+  for (; i < text.size(); ++i) {
+    const char16_t c = text[i];
+    if (c == u'.' && decimals < 0) {
+      decimals = 0;
+      continue;
+    }
+    if (c < u'0' || c > u'9' || ++count > 15)
+      return false;
+    digits = digits * 10 + static_cast<std::uint64_t>(c - u'0');
+    decimals += decimals >= 0;
+  }
+  if (count == 0 || decimals == 0)
+    return false; // "", "-", "." and "5." go to the general reader
+  const double magnitude = static_cast<double>(digits) / kPowers[decimals < 0 ? 0 : decimals];
+  value = negative ? -magnitude : magnitude;
+  return true;
+}
+
 ZelUtils::Any NumberConversionPolicy::FromText(const ZelStringT<char16_t>& text) const {
+  double value = 0;
+  if (ReadShortDecimal(text.GetView(), value))
+    return ZelUtils::Any(value);
   return ZelUtils::Any(ParseNumber(TrimmedAscii(text)));
 }
 

@@ -103,6 +103,11 @@ std::vector<PropertyKey> OwnKeys(const PropertyMap& properties) {
 // PropertyMap
 
 bool PropertyMap::Insert(const PropertyKey& key, ZelUtils::Any&& value) {
+  // Documents list values in key order: appending is the usual case.
+  if (m_entries.empty() || m_entries.back().first < key) {
+    m_entries.emplace_back(key, std::move(value));
+    return true;
+  }
   const std::size_t i = LowerBound(key);
   if (i < m_entries.size() && m_entries[i].first == key)
     return false;
@@ -464,6 +469,7 @@ void Style::SetProperty(const PropertyKey& key, ZelUtils::Any&& value) {
   }
   if (ZelUtils::Any* old = m_properties.Find(key)) {
     behaviour->DestroyPropertyData(*old);
+    // The destroy step may have edited the values: look again.
     if ((old = m_properties.Find(key)) != nullptr) {
       *old = std::move(result);
       return;

@@ -72,6 +72,8 @@ public:
 
   // The value stored under `key`, or null.
   const ZelUtils::Any* Find(const PropertyKey& key) const noexcept {
+    if (m_entries.empty() || m_entries.back().first < key)
+      return nullptr; // beyond the last key, as a value being appended is
     const std::size_t i = LowerBound(key);
     return i < m_entries.size() && m_entries[i].first == key ? &m_entries[i].second : nullptr;
   }

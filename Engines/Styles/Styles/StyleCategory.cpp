@@ -3,6 +3,7 @@
 #include <Styles/StyleProperty.h>
 
 #include <algorithm>
+#include <cstring>
 #include <exception>
 
 namespace Styles {
@@ -19,13 +20,19 @@ void StyleCategory::RegisterProperty(const PropertyKey& key, BaseStyleProperty* 
   // Everything that allocates comes first, so that a failure changes nothing.
   m_propertyOrder.reserve(m_propertyOrder.size() + 1);
   m_byKey.reserve(m_byKey.size() + 1);
-  const auto entry = m_properties.emplace(key, property).first;
-  try {
-    m_byName.emplace(key.GetView(), property);
-  } catch (...) {
-    m_properties.erase(entry);
-    throw;
+  std::vector<std::pair<std::u16string_view, BaseStyleProperty*>> byName;
+  const std::size_t count = m_byKey.size() + 1;
+  if (count * 2 > m_byName.size()) {
+    byName.resize(std::max<std::size_t>(8, m_byName.size() * 2));
+    for (const auto& [name, behaviour] : m_byName)
+      if (behaviour)
+        PlaceByName(byName, name, behaviour);
   }
+  m_properties.emplace(key, property);
+  // Nothing below throws.
+  if (!byName.empty())
+    m_byName.swap(byName);
+  PlaceByName(m_byName, key.GetView(), property);
   m_propertyOrder.push_back(key);
   const auto at = std::lower_bound(m_byKey.begin(), m_byKey.end(), key,
                                    [](const auto& item, PropertyKey k) { return item.first < k; });
@@ -47,9 +54,38 @@ BaseStyleProperty* StyleCategory::GetStyleProperty(const PropertyKey& key) const
   return at != m_byKey.end() && at->first == key ? at->second : nullptr;
 }
 
+namespace {
+
+// A cheap hash of a property name: its length and three of its characters.
+std::size_t HashName(std::u16string_view name) {
+  std::size_t hash = name.size();
+  if (!name.empty())
+    hash = ((hash * 31 + name.front()) * 31 + name[name.size() / 2]) * 31 + name.back();
+  return hash;
+}
+
+} // namespace
+
+void StyleCategory::PlaceByName(std::vector<std::pair<std::u16string_view, BaseStyleProperty*>>& table,
+                                std::u16string_view name, BaseStyleProperty* property) {
+  const std::size_t mask = table.size() - 1;
+  std::size_t i = HashName(name) & mask;
+  while (table[i].second)
+    i = (i + 1) & mask;
+  table[i] = {name, property};
+}
+
 BaseStyleProperty* StyleCategory::FindStyleProperty(std::u16string_view name) const {
-  const auto found = m_byName.find(name);
-  return found != m_byName.end() ? found->second : nullptr;
+  if (m_byName.empty())
+    return nullptr;
+  const std::size_t mask = m_byName.size() - 1;
+  for (std::size_t i = HashName(name) & mask; m_byName[i].second; i = (i + 1) & mask) {
+    const std::u16string_view candidate = m_byName[i].first;
+    if (candidate.size() == name.size() &&
+        std::memcmp(candidate.data(), name.data(), name.size() * sizeof(char16_t)) == 0)
+      return m_byName[i].second;
+  }
+  return nullptr;
 }
 
 const ZelUtils::Any& StyleCategory::GetDefaultValue(const PropertyKey& key) const {

@@ -11,7 +11,6 @@
 
 #include <map>
 #include <string_view>
-#include <unordered_map>
 #include <utility>
 #include <vector>
 
@@ -59,14 +58,19 @@ public:
   }
 
 private:
+  // Puts `property` under `name` into a by-name table with a free slot.
+  static void PlaceByName(std::vector<std::pair<std::u16string_view, BaseStyleProperty*>>& table,
+                          std::u16string_view name, BaseStyleProperty* property);
+
   PropertyKey m_key;
   ZelStringT<char16_t> m_uiName;
   std::vector<PropertyKey> m_propertyOrder;
   std::map<PropertyKey, BaseStyleProperty*> m_properties;
   bool m_flag;
-  // The same behaviours for fast lookups: by key identity, and by key text.
+  // The same behaviours for fast lookups: by key identity, and by key text in
+  // a small open-addressing table (half full at most).
   std::vector<std::pair<PropertyKey, BaseStyleProperty*>> m_byKey;
-  std::unordered_map<std::u16string_view, BaseStyleProperty*> m_byName;
+  std::vector<std::pair<std::u16string_view, BaseStyleProperty*>> m_byName;
 };
 
 } // namespace Styles

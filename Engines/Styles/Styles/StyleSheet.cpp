@@ -299,7 +299,8 @@ public:
     std::uint32_t nameLength = 0;
     std::uint32_t foldedStart = 0;
     std::uint32_t foldedLength = 0;
-    bool listed = true; // in the name index (and so in name order)
+    std::uint32_t importStamp = 0; // the import that filed the style held here
+    bool listed = true;            // in the name index (and so in name order)
     bool erased = false;
 
     std::u16string_view Name() const noexcept { return {text.get(), nameLength}; }
@@ -310,6 +311,10 @@ public:
   Entry* Find(std::u16string_view name) const {
     thread_local std::u16string folded;
     ZelPlatform::detail::FoldCaseUtf16(name, folded);
+    return FindFolded(folded);
+  }
+  // The same for a name already folded.
+  Entry* FindFolded(std::u16string_view folded) const {
     return m_byName.Find(folded, HashName(folded));
   }
   // The entry of `style`, also when its name was dropped; null for null.
@@ -317,6 +322,8 @@ public:
     return style ? m_byStyle.Find(style, HashStyle(style)) : nullptr;
   }
   std::size_t Size() const noexcept { return m_byName.Size(); }
+  // A number that no earlier import was given, to mark what this one files.
+  std::uint32_t NextImportStamp() noexcept { return ++m_importStamps; }
   void Reserve(std::size_t count) {
     m_byName.Reserve(count);
     m_byStyle.Reserve(count);
@@ -327,6 +334,10 @@ public:
   Entry* Add(std::u16string_view name, Style* style) {
     thread_local std::u16string folded;
     ZelPlatform::detail::FoldCaseUtf16(name, folded);
+    return Add(name, folded, style);
+  }
+  // The same for a name whose folding is known.
+  Entry* Add(std::u16string_view name, std::u16string_view folded, Style* style) {
     std::unique_ptr<char16_t[]> text = Spell(name, folded);
     MakeRoomForOne(m_ordered);
     MakeRoomForOne(m_pending);
@@ -467,6 +478,7 @@ private:
   mutable std::vector<Entry*> m_pending; // filed since the last ordering
   mutable bool m_stale = false;          // names dropped since then
   mutable std::size_t m_erased = 0;
+  std::uint32_t m_importStamps = 0;
   EntryTable<Entry, FoldedOf> m_byName;
   EntryTable<Entry, StyleOf> m_byStyle;
 };
@@ -483,12 +495,14 @@ std::pair<detail::StyleIndex::Entry*, bool> FileStyle(detail::StyleIndex& index,
                                                       std::u16string_view name, Style* style,
                                                       bool replace, Style*& previous) {
   previous = nullptr;
-  detail::StyleIndex::Entry* found = index.Find(name);
+  thread_local std::u16string folded;
+  ZelPlatform::detail::FoldCaseUtf16(name, folded);
+  detail::StyleIndex::Entry* found = index.FindFolded(folded);
   if (found && !replace)
     return {found, false};
   try {
     if (!found)
-      return {index.Add(name, style), true};
+      return {index.Add(name, folded, style), true};
     // Replacing re-files the name under the caller's spelling.
     previous = found->style;
     index.Replace(found, name, style);
@@ -847,13 +861,14 @@ bool IsCategory(const StyleManager& manager, std::u16string_view name) {
 template <class Access>
 void StyleSheet::ImportMembers(const typename Access::Object& document, bool replace) {
   StyleManager& manager = GetStyleManager();
-  // Styles made by this import, sorted after the first pass; only they are
-  // read, so styles that were in the sheet before are never read into.
-  std::vector<const Style*> created;
+  // Entries that hold a style made by this import carry its stamp; only
+  // those styles are read, so styles that were in the sheet before are never
+  // read into.
+  const std::uint32_t stamp = m_index->NextImportStamp();
   // The index entry filed under each style member's name, in document order.
   // Import never erases an entry (a replacement re-files it), so the second
   // pass reads each entry instead of searching for the name again.
-  std::vector<const detail::StyleIndex::Entry*> filed;
+  std::vector<detail::StyleIndex::Entry*> filed;
   // Styles that replacements took out of the sheet, with the entry of the
   // name each held. They are destroyed after the first pass, once every style
   // that referred to one refers to the style holding its name at that time.
@@ -905,16 +920,16 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
       for (std::size_t j = 0; j < Access::Size(*category); ++j) {
         Access::RequireObject(Access::Member(*category, j)); // std::bad_cast for a non-object
         // Room first, so that nothing below can throw once a style is out.
-        MakeRoomForOne(created);
         MakeRoomForOne(filed);
         MakeRoomForOne(replaced);
         Style* style = new Style;
-        created.push_back(style);
         Style* previous = nullptr;
         // FileStyle owns `style`, also when it throws.
         const auto [entry, isFiled] =
             FileStyle(*m_index, Access::Name(*category, j), style, replace, previous);
-        if (!isFiled)
+        if (isFiled)
+          entry->importStamp = stamp;
+        else
           delete style;
         if (previous)
           replaced.emplace_back(previous, entry);
@@ -926,9 +941,6 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
     throw;
   }
   repairReplaced();
-  // An address freed in the first pass can only have been reused by a style
-  // made later in it, so membership in `created` stays exact.
-  std::sort(created.begin(), created.end());
 
   const ImportScope scope(m_import);
   JsonValue scratch;
@@ -945,9 +957,10 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
     if (!categoryKey || !manager.FindCategory(*categoryKey))
       continue;
     for (std::size_t j = 0; j < Access::Size(*category); ++j) {
-      Style* style = filed[next++]->style;
-      if (!std::binary_search(created.begin(), created.end(), style))
+      const detail::StyleIndex::Entry* entry = filed[next++];
+      if (entry->importStamp != stamp)
         continue;
+      Style* style = entry->style;
       style->SetCategory(*categoryKey);
       style->ReadMembers<Access>(*this, Access::RequireObject(Access::Member(*category, j)),
                                  scratch);

@@ -57,6 +57,8 @@ TEST(ConversionPolicyTest, NumberRoundTripsShortestText) {
     ASSERT_EQ(std::string(text.GetView().begin(), text.GetView().end()),
               std::string(static_cast<const char*>(expected), end))
         << value;
+    const double read = policy.FromText(text).Get<double>();
+    ASSERT_TRUE(read == value && std::signbit(read) == std::signbit(value)) << value;
   }
 }
 
