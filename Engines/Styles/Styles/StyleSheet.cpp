@@ -18,7 +18,6 @@
 #include <memory>
 #include <optional>
 #include <typeinfo>
-#include <unordered_map>
 #include <utility>
 
 namespace Styles {
@@ -90,10 +89,42 @@ private:
     std::uint32_t child[2] = {kNone, kNone};
     std::uint32_t up = kNone; // parent in the splay tree, else the path's parent
   };
+  struct Slot {
+    const Style* style = nullptr;
+    std::uint32_t node = kNone;
+  };
 
   std::uint32_t Find(const Style* style) const {
-    const auto found = m_index.find(style);
-    return found == m_index.end() ? kNone : found->second;
+    if (m_slots.empty())
+      return kNone;
+    for (std::size_t i = Hash(style);; i = (i + 1) & (m_slots.size() - 1)) {
+      if (!m_slots[i].style)
+        return kNone;
+      if (m_slots[i].style == style)
+        return m_slots[i].node;
+    }
+  }
+  // Files `node` as the node of `style`, which has none yet.
+  void Index(const Style* style, std::uint32_t node) {
+    if ((m_nodes.size() + 1) * 2 > m_slots.size()) {
+      std::vector<Slot> slots(std::max<std::size_t>(64, m_slots.size() * 2));
+      slots.swap(m_slots);
+      for (const Slot& slot : slots)
+        if (slot.style)
+          Place(slot);
+    }
+    Place(Slot{style, node});
+  }
+  void Place(const Slot& slot) {
+    std::size_t i = Hash(slot.style);
+    while (m_slots[i].style)
+      i = (i + 1) & (m_slots.size() - 1);
+    m_slots[i] = slot;
+  }
+  std::size_t Hash(const Style* style) const {
+    return static_cast<std::size_t>((reinterpret_cast<std::uintptr_t>(style) >> 4) *
+                                    0x9E3779B97F4A7C15ull) &
+           (m_slots.size() - 1);
   }
   // The node of `style`, made with those of its ancestors when missing.
   std::uint32_t Load(const Style* style) {
@@ -108,8 +139,8 @@ private:
     }
     for (auto it = m_chain.rbegin(); it != m_chain.rend(); ++it) {
       const auto node = static_cast<std::uint32_t>(m_nodes.size());
+      Index(*it, node);
       m_nodes.emplace_back();
-      m_index.emplace(*it, node);
       if (above != kNone)
         Attach(node, above);
       above = node;
@@ -178,7 +209,8 @@ private:
   }
 
   std::vector<Node> m_nodes;
-  std::unordered_map<const Style*, std::uint32_t> m_index;
+  // Each style's node, by open addressing on the style's address.
+  std::vector<Slot> m_slots;
   std::vector<const Style*> m_chain; // scratch of Load
 };
 
