@@ -880,16 +880,6 @@ bool StyleSheet::ImportJson(Json::Object* document, bool replace) {
   return true;
 }
 
-namespace {
-
-// Whether a category is registered under `name`, without pooling the name.
-bool IsCategory(const StyleManager& manager, std::u16string_view name) {
-  const std::optional<PropertyKey> key = PropertyKey::Find(name);
-  return key && manager.FindCategory(*key);
-}
-
-} // namespace
-
 template <class Access>
 void StyleSheet::ImportMembers(const typename Access::Object& document, bool replace) {
   StyleManager& manager = GetStyleManager();
@@ -933,12 +923,9 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
     }
   };
 
-  try {
-    std::size_t styleCount = m_index->Size();
-    for (std::size_t i = 0; i < memberCount; ++i)
-      if (const auto category = Access::AsObject(Access::Member(document, i)))
-        styleCount += Access::Size(*category);
-    m_index->Reserve(styleCount);
+  // Goes through the members in document order: the sheet's own members
+  // are applied, and `styles` gets each registered category's object.
+  const auto forEachMember = [&](auto&& styles) {
     for (std::size_t i = 0; i < memberCount; ++i) {
       const std::u16string_view name = Access::Name(document, i);
       const typename Access::Value value = Access::Member(document, i);
@@ -947,10 +934,21 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
         applySheetMember(name, value);
         continue;
       }
-      if (!IsCategory(manager, name))
-        continue;
-      for (std::size_t j = 0; j < Access::Size(*category); ++j) {
-        Access::RequireObject(Access::Member(*category, j)); // std::bad_cast for a non-object
+      const std::optional<PropertyKey> categoryKey = PropertyKey::Find(name);
+      if (categoryKey && manager.FindCategory(*categoryKey))
+        styles(*categoryKey, *category);
+    }
+  };
+
+  try {
+    std::size_t styleCount = m_index->Size();
+    for (std::size_t i = 0; i < memberCount; ++i)
+      if (const auto category = Access::AsObject(Access::Member(document, i)))
+        styleCount += Access::Size(*category);
+    m_index->Reserve(styleCount);
+    forEachMember([&](const PropertyKey&, const typename Access::Object& category) {
+      for (std::size_t j = 0; j < Access::Size(category); ++j) {
+        Access::RequireObject(Access::Member(category, j)); // std::bad_cast for a non-object
         // Room first, so that nothing below can throw once a style is out.
         MakeRoomForOne(filed);
         MakeRoomForOne(replaced);
@@ -958,7 +956,7 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
         Style* previous = nullptr;
         // FileStyle owns `style`, also when it throws.
         const auto [entry, isFiled] =
-            FileStyle(*m_index, Access::Name(*category, j), style, replace, previous);
+            FileStyle(*m_index, Access::Name(category, j), style, replace, previous);
         if (isFiled)
           entry->importStamp = stamp;
         else
@@ -967,7 +965,7 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
           replaced.emplace_back(previous, entry);
         filed.push_back(entry);
       }
-    }
+    });
   } catch (...) {
     repairReplaced();
     throw;
@@ -977,29 +975,19 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
   const ImportScope scope(m_import);
   JsonValue scratch;
   std::size_t next = 0;
-  for (std::size_t i = 0; i < memberCount; ++i) {
-    const std::u16string_view name = Access::Name(document, i);
-    const typename Access::Value value = Access::Member(document, i);
-    const auto category = Access::AsObject(value);
-    if (!category) {
-      applySheetMember(name, value);
-      continue;
-    }
-    const std::optional<PropertyKey> categoryKey = PropertyKey::Find(name);
-    if (!categoryKey || !manager.FindCategory(*categoryKey))
-      continue;
-    for (std::size_t j = 0; j < Access::Size(*category); ++j) {
+  forEachMember([&](const PropertyKey& categoryKey, const typename Access::Object& category) {
+    for (std::size_t j = 0; j < Access::Size(category); ++j) {
       const detail::StyleIndex::Entry* entry = filed[next++];
       if (entry->importStamp != stamp)
         continue;
       Style* style = entry->style;
-      style->SetCategory(*categoryKey);
-      style->ReadMembers<Access>(*this, Access::RequireObject(Access::Member(*category, j)),
+      style->SetCategory(categoryKey);
+      style->ReadMembers<Access>(*this, Access::RequireObject(Access::Member(category, j)),
                                  scratch);
       if (!m_externalID.IsEmpty())
         style->SetExternalID(m_externalID);
     }
-  }
+  });
 
   if (!versionSeen)
     m_version = 0;
