@@ -36,8 +36,8 @@ struct STYLES_API WImportStyleInfo {
   std::unordered_map<ZelStringT<char16_t>, ZelStringT<char16_t>> renames;
 };
 
-/// The registry of categories and their behaviours; one per process, reached
-/// through GetStyleManager().
+/// The registry of categories and their behaviours. Styles and sheets consult
+/// the process's one, which GetStyleManager() returns.
 class STYLES_API StyleManager {
 public:
   StyleManager();
