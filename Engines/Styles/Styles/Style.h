@@ -150,6 +150,7 @@ private:
 /// parent and owner are never owned.
 class STYLES_API Style {
 public:
+  /// A free style without category, parent or values; see SetCategory.
   Style();
   /// A free style of the category registered under `categoryName` (none when
   /// unknown) inheriting from `parent` (not owned).

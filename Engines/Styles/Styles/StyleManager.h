@@ -40,6 +40,8 @@ struct STYLES_API WImportStyleInfo {
 /// the process's one, which GetStyleManager() returns.
 class STYLES_API StyleManager {
 public:
+  /// An empty registry of version -1. Styles never consult it: only the
+  /// process's manager counts.
   StyleManager();
   StyleManager(const StyleManager&) = delete;
   StyleManager& operator=(const StyleManager&) = delete;
