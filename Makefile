@@ -2,32 +2,45 @@
 BUILD_DIR      ?= build
 ASAN_BUILD_DIR ?= build-asan
 BENCH_BUILD_DIR ?= build-bench
+DOCS_BUILD_DIR := build-docs
 BUILD_TYPE     ?= RelWithDebInfo
 JOBS           ?= $(shell nproc 2>/dev/null || echo 2)
 WERROR         ?= OFF
 PREFIX         ?= /usr/local
 
-# Debian packages the build needs.
+# Debian packages the build needs; the reference needs only its own, which
+# `make docs` (or `make deps DOCS=1`) installs.
 PACKAGES := cmake make g++ pkg-config rapidjson-dev libicu-dev libgtest-dev libbenchmark-dev libcli11-dev
+DOCS_PACKAGES := doxygen
+
+# The project version, shown in the reference.
+VERSION := $(shell sed -n 's/^project.Styles VERSION \([0-9.]*\).*/\1/p' CMakeLists.txt)
 
 CMAKE_FLAGS := -DCMAKE_BUILD_TYPE=$(BUILD_TYPE) -DSTYLES_WARNINGS_AS_ERRORS=$(WERROR)
 
-.PHONY: all deps configure build test test-asan bench demo install format clean
+.PHONY: all deps docs-deps configure build test test-asan bench demo docs install format clean
 
 all: build
 
 # Installs the missing Debian packages: one apt-get update, then one install.
-deps:
+define install-missing
 	@missing=""; \
-	for p in $(PACKAGES); do \
+	for p in $(1); do \
 	  dpkg-query -W -f='$${Status}' $$p 2>/dev/null | grep -q "install ok installed" || missing="$$missing $$p"; \
 	done; \
 	if [ -n "$$missing" ]; then \
 	  echo "Installing:$$missing"; \
 	  apt-get update && DEBIAN_FRONTEND=noninteractive apt-get install -y --no-install-recommends $$missing; \
 	else \
-	  echo "All build dependencies are installed."; \
+	  echo "All $(2) are installed."; \
 	fi
+endef
+
+deps:
+	$(call install-missing,$(PACKAGES) $(if $(DOCS),$(DOCS_PACKAGES)),build dependencies)
+
+docs-deps:
+	$(call install-missing,$(DOCS_PACKAGES),documentation dependencies)
 
 configure: deps
 	cmake -S . -B $(BUILD_DIR) $(CMAKE_FLAGS)
@@ -55,6 +68,18 @@ bench: deps
 demo: build
 	$(BUILD_DIR)/examples/WordProcessorDemo
 
+# The API reference in $(DOCS_BUILD_DIR)/html/, from the public headers and
+# docs/. Doxygen fails on any warning (an undocumented public member, a broken
+# reference); a qualified name in backticks that links nowhere fails too.
+docs: docs-deps
+	rm -rf $(DOCS_BUILD_DIR)
+	STYLES_VERSION=$(VERSION) doxygen docs/Doxyfile
+	@if grep -o -E '<code>(Styles|Zel[A-Za-z]*|Json|SystemIO)::[^<]*</code>' \
+	    $(DOCS_BUILD_DIR)/html/*.html | grep -v '^$(DOCS_BUILD_DIR)/html/index.html:'; then \
+	  echo "docs: the names above link to nothing in the reference"; exit 1; \
+	fi
+	@echo "Reference: $(DOCS_BUILD_DIR)/html/index.html"
+
 install: build
 	cmake --install $(BUILD_DIR) --prefix $(PREFIX)
 
@@ -62,4 +87,4 @@ format:
 	find Engines tests benchmarks examples -name '*.h' -o -name '*.cpp' | xargs clang-format -i
 
 clean:
-	rm -rf $(BUILD_DIR) $(ASAN_BUILD_DIR) $(BENCH_BUILD_DIR)
+	rm -rf $(BUILD_DIR) $(ASAN_BUILD_DIR) $(BENCH_BUILD_DIR) $(DOCS_BUILD_DIR)
