@@ -2,6 +2,7 @@
 
 #include <Styles/StyleCategory.h>
 #include <Styles/StyleManager.h>
+#include <Styles/StyleProperty.h>
 
 #include <Styles/Internal/JsonAccess.h>
 
@@ -868,6 +869,7 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
     replaced.clear();
   };
   bool versionSeen = false;
+  bool anyReplaced = false;
 
   // The members are gone through twice. The first pass makes an empty style
   // for every name, so that every reference resolves when the second pass
@@ -916,8 +918,10 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
             FileStyle(*m_index, Access::Name(*category, j), style, replace, previous);
         if (!isFiled)
           delete style;
-        if (previous)
+        if (previous) {
           replaced.emplace_back(previous, entry);
+          anyReplaced = true;
+        }
         filed.push_back(entry);
       }
     }
@@ -931,6 +935,38 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
   std::sort(created.begin(), created.end());
 
   const ImportScope scope(m_import);
+  // The styles read, and after a replacement every style (a redirected
+  // substyle may now inherit from a style read), are checked for substyles
+  // that inherit their way back to the style holding them: once every link
+  // is known, also when a behaviour throws.
+  const auto dropContainedParents = [&] {
+    std::vector<Style*> roots;
+    if (anyReplaced) {
+      roots = GetStyles();
+    } else {
+      for (const detail::StyleIndex::Entry* entry : filed)
+        if (std::binary_search(created.begin(), created.end(), entry->style))
+          roots.push_back(entry->style);
+    }
+    DropSubstyleCycles(roots);
+  };
+  try {
+    ReadStyles<Access>(document, filed, created, applySheetMember);
+  } catch (...) {
+    dropContainedParents();
+    throw;
+  }
+  dropContainedParents();
+
+  if (!versionSeen)
+    m_version = 0;
+}
+
+template <class Access, class Entries, class Created, class SheetMember>
+void StyleSheet::ReadStyles(const typename Access::Object& document, const Entries& filed,
+                            const Created& created, const SheetMember& applySheetMember) {
+  const StyleManager& manager = GetStyleManager();
+  const std::size_t memberCount = Access::Size(document);
   JsonValue scratch;
   std::size_t next = 0;
   for (std::size_t i = 0; i < memberCount; ++i) {
@@ -955,9 +991,87 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
         style->SetExternalID(m_externalID);
     }
   }
+}
 
-  if (!versionSeen)
-    m_version = 0;
+void StyleSheet::DropSubstyleCycles(const std::vector<Style*>& roots) {
+  // A graph of styles: each points to its parent and to the parent of every
+  // substyle in its tree. Tarjan's algorithm, without recursion, finds the
+  // groups of styles that reach one another; parent links alone never close
+  // a circle, so dropping the substyle links inside each group leaves none.
+  struct Node {
+    std::vector<Style*> linked; // substyles in the tree that have a parent
+    std::size_t index = 0;      // order of discovery, from 1
+    std::size_t low = 0;        // lowest index reached; the group's index once done
+    std::size_t next = 0;       // the next link to follow: the parent, then linked
+    bool onStack = false;
+  };
+  std::unordered_map<const Style*, Node> nodes;
+  std::vector<const Style*> stack, path;
+  std::size_t discovered = 0;
+  const auto enter = [&](const Style* style) {
+    Node& node = nodes[style];
+    node.index = node.low = ++discovered;
+    node.onStack = true;
+    stack.push_back(style);
+    path.push_back(style);
+    std::vector<const Style*> pending{style};
+    while (!pending.empty()) {
+      const Style* holder = pending.back();
+      pending.pop_back();
+      for (const PropertyMap::Entry& entry : holder->GetProperties())
+        if (const BaseStyleProperty* behaviour = holder->FindBehaviour(entry.first))
+          behaviour->ProcessStylesInProperty(entry.second, [&](Style* substyle) {
+            if (substyle) {
+              if (substyle->m_parent)
+                node.linked.push_back(substyle);
+              pending.push_back(substyle);
+            }
+            return true;
+          });
+    }
+  };
+  for (const Style* root : roots) {
+    if (!root || nodes.count(root))
+      continue;
+    enter(root);
+    while (!path.empty()) {
+      const Style* style = path.back();
+      Node& node = nodes[style]; // references survive rehashing
+      if (node.next <= node.linked.size()) {
+        const Style* to = node.next == 0 ? style->m_parent : node.linked[node.next - 1]->m_parent;
+        ++node.next;
+        if (!to)
+          continue;
+        const auto found = nodes.find(to);
+        if (found == nodes.end())
+          enter(to);
+        else if (found->second.onStack)
+          node.low = std::min(node.low, found->second.index);
+        continue;
+      }
+      path.pop_back();
+      if (!path.empty()) {
+        Node& above = nodes[path.back()];
+        above.low = std::min(above.low, node.low);
+      }
+      if (node.low == node.index) {
+        const Style* member = nullptr;
+        do {
+          member = stack.back();
+          stack.pop_back();
+          Node& grouped = nodes[member];
+          grouped.onStack = false;
+          grouped.low = node.index;
+        } while (member != style);
+      }
+    }
+  }
+  for (const auto& [style, node] : nodes)
+    for (Style* substyle : node.linked) {
+      const auto found = nodes.find(substyle->m_parent);
+      if (found != nodes.end() && found->second.low == node.low)
+        substyle->m_parent = nullptr;
+    }
 }
 
 bool StyleSheet::ImportFromString(const ZelStringT<char16_t>& text, bool replace) {
