@@ -2,6 +2,7 @@
 
 #include <Styles/StyleCategory.h>
 #include <Styles/StyleManager.h>
+#include <Styles/StyleProperty.h>
 
 #include <Styles/Internal/JsonAccess.h>
 
@@ -905,6 +906,7 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
     replaced.clear();
   };
   bool versionSeen = false;
+  bool anyReplaced = false;
 
   // The members are gone through twice. The first pass makes an empty style
   // for every name, so that every reference resolves when the second pass
@@ -961,8 +963,10 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
           entry->importStamp = stamp;
         else
           delete style;
-        if (previous)
+        if (previous) {
           replaced.emplace_back(previous, entry);
+          anyReplaced = true;
+        }
         filed.push_back(entry);
       }
     });
@@ -973,24 +977,126 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
   repairReplaced();
 
   const ImportScope scope(m_import);
-  JsonValue scratch;
-  std::size_t next = 0;
-  forEachMember([&](const PropertyKey& categoryKey, const typename Access::Object& category) {
-    for (std::size_t j = 0; j < Access::Size(category); ++j) {
-      const detail::StyleIndex::Entry* entry = filed[next++];
-      if (entry->importStamp != stamp)
-        continue;
-      Style* style = entry->style;
-      style->SetCategory(categoryKey);
-      style->ReadMembers<Access>(*this, Access::RequireObject(Access::Member(category, j)),
-                                 scratch);
-      if (!m_externalID.IsEmpty())
-        style->SetExternalID(m_externalID);
+  // The styles read, and after a replacement every style (a redirected
+  // substyle may now inherit from a style read), are checked for substyles
+  // that inherit their way back to the style holding them: once every link
+  // is known, also when a behaviour throws.
+  const auto dropContainedParents = [&] {
+    std::vector<Style*> roots;
+    if (anyReplaced) {
+      roots = GetStyles();
+    } else {
+      for (const detail::StyleIndex::Entry* entry : filed)
+        if (entry->importStamp == stamp)
+          roots.push_back(entry->style);
     }
-  });
+    DropSubstyleCycles(roots);
+  };
+  try {
+    JsonValue scratch;
+    std::size_t next = 0;
+    forEachMember([&](const PropertyKey& categoryKey, const typename Access::Object& category) {
+      for (std::size_t j = 0; j < Access::Size(category); ++j) {
+        const detail::StyleIndex::Entry* entry = filed[next++];
+        if (entry->importStamp != stamp)
+          continue;
+        Style* style = entry->style;
+        style->SetCategory(categoryKey);
+        style->ReadMembers<Access>(*this, Access::RequireObject(Access::Member(category, j)),
+                                   scratch);
+        if (!m_externalID.IsEmpty())
+          style->SetExternalID(m_externalID);
+      }
+    });
+  } catch (...) {
+    dropContainedParents();
+    throw;
+  }
+  dropContainedParents();
 
   if (!versionSeen)
     m_version = 0;
+}
+
+void StyleSheet::DropSubstyleCycles(const std::vector<Style*>& roots) {
+  // A graph of styles: each points to its parent and to the parent of every
+  // substyle in its tree. Tarjan's algorithm, without recursion, finds the
+  // groups of styles that reach one another; parent links alone never close
+  // a circle, so dropping the substyle links inside each group leaves none.
+  struct Node {
+    std::vector<Style*> linked; // substyles in the tree that have a parent
+    std::size_t index = 0;      // order of discovery, from 1
+    std::size_t low = 0;        // lowest index reached; the group's index once done
+    std::size_t next = 0;       // the next link to follow: the parent, then linked
+    bool onStack = false;
+  };
+  std::unordered_map<const Style*, Node> nodes;
+  std::vector<const Style*> stack, path;
+  std::size_t discovered = 0;
+  const auto enter = [&](const Style* style) {
+    Node& node = nodes[style];
+    node.index = node.low = ++discovered;
+    node.onStack = true;
+    stack.push_back(style);
+    path.push_back(style);
+    std::vector<const Style*> pending{style};
+    while (!pending.empty()) {
+      const Style* holder = pending.back();
+      pending.pop_back();
+      for (const PropertyMap::Entry& entry : holder->GetProperties())
+        if (const BaseStyleProperty* behaviour = holder->FindBehaviour(entry.first))
+          behaviour->ProcessStylesInProperty(entry.second, [&](Style* substyle) {
+            if (substyle) {
+              if (substyle->m_parent)
+                node.linked.push_back(substyle);
+              pending.push_back(substyle);
+            }
+            return true;
+          });
+    }
+  };
+  for (const Style* root : roots) {
+    if (!root || nodes.count(root))
+      continue;
+    enter(root);
+    while (!path.empty()) {
+      const Style* style = path.back();
+      Node& node = nodes[style]; // references survive rehashing
+      if (node.next <= node.linked.size()) {
+        const Style* to = node.next == 0 ? style->m_parent : node.linked[node.next - 1]->m_parent;
+        ++node.next;
+        if (!to)
+          continue;
+        const auto found = nodes.find(to);
+        if (found == nodes.end())
+          enter(to);
+        else if (found->second.onStack)
+          node.low = std::min(node.low, found->second.index);
+        continue;
+      }
+      path.pop_back();
+      if (!path.empty()) {
+        Node& above = nodes[path.back()];
+        above.low = std::min(above.low, node.low);
+      }
+      if (node.low == node.index) {
+        const Style* member = nullptr;
+        do {
+          member = stack.back();
+          stack.pop_back();
+          Node& grouped = nodes[member];
+          grouped.onStack = false;
+          grouped.low = node.index;
+        } while (member != style);
+      }
+    }
+  }
+  for (const auto& [style, node] : nodes)
+    for (Style* substyle : node.linked) {
+      const auto found = nodes.find(substyle->m_parent);
+      if (found != nodes.end() && found->second.low == node.low)
+        substyle->m_parent = nullptr;
+    }
 }
 
 bool StyleSheet::ImportFromString(const ZelStringT<char16_t>& text, bool replace) {

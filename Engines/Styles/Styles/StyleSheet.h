@@ -196,6 +196,11 @@ private:
   // Imports the members of a document held as Access describes it (a value
   // tree or a compact document): ImportJson's work for either.
   template <class Access> void ImportMembers(const typename Access::Object& document, bool replace);
+  // Drops the parent of every substyle, in the trees of `roots` and of the
+  // styles they lead to, whose parent leads back (through parents and other
+  // substyles' parents) to the style holding it: it would take values from
+  // a style holding it, which flattening or repairing copies without end.
+  static void DropSubstyleCycles(const std::vector<Style*>& roots);
   // The style filed under `name` in any letter case, or null.
   Style* FindStyle(std::u16string_view name) const;
   // The name `style` is filed under, not copied; empty when it is not filed.
