@@ -381,6 +381,8 @@ public:
     }
   }
 
+  bool HasRuns() const { return !m_runs.empty(); }
+
   void PrintSummary() const {
     std::printf("\nSummary (ratios from this one run; the machine is a shared 2-core one)\n");
     for (const char* variant : {"0", "1"}) {
@@ -466,7 +468,8 @@ int main(int argc, char** argv) {
     return 1;
   SummaryReporter reporter;
   benchmark::RunSpecifiedBenchmarks(&reporter);
-  reporter.PrintSummary();
+  if (reporter.HasRuns()) // nothing ran when the benchmarks were only listed
+    reporter.PrintSummary();
   benchmark::Shutdown();
   return 0;
 }
