@@ -760,6 +760,12 @@ TEST_F(StyleSheetTest, HostileDocuments) {
                      uR"( "R2": {"nested": {"inherits": "R1"}}}})");
        },
        Outcome::Accepted},
+      {"one name under two categories, the first holding substyles", 0,
+       [&](int) {
+         return Text(uR"({"sheetTestParagraph": {"Q": {"sheetTestCharacter": {"nested": {}},)"
+                     uR"( "runs": [{}]}}, "sheetTestCharacter": {"Q": {"size": "2"}}})");
+       },
+       Outcome::Accepted},
       {"numbers at the edges of double range", 0,
        [&](int) {
          return paragraphs(uR"("A": {"size": 1.7976931348623157e308, "font": -4.9e-324,)"

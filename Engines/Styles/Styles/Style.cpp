@@ -193,12 +193,29 @@ const ZelUtils::Any& Style::DefaultValue(const PropertyKey& key) const {
 }
 
 void Style::SetCategory(const PropertyKey& name) {
+  std::shared_ptr<StyleCategory> category;
   try {
-    if (const std::shared_ptr<StyleCategory>* category = GetStyleManager().FindCategory(name))
-      m_category = *category;
+    if (const std::shared_ptr<StyleCategory>* found = GetStyleManager().FindCategory(name))
+      category = *found;
   } catch (...) {
     // The style keeps its previous category.
   }
+  if (!category || category == m_category)
+    return;
+  // A value that the new category has no behaviour of the same kind for could
+  // never be destroyed afterwards: the behaviour that made it frees it now.
+  for (std::size_t i = 0; m_category && i < m_properties.size();) {
+    PropertyMap::Entry& entry = m_properties[i];
+    BaseStyleProperty* behaviour = m_category->GetStyleProperty(entry.first);
+    const BaseStyleProperty* next = category->GetStyleProperty(entry.first);
+    if (behaviour && (!next || typeid(*next) != typeid(*behaviour))) {
+      behaviour->DestroyPropertyData(entry.second);
+      m_properties.Erase(PropertyKey(entry.first));
+    } else {
+      ++i;
+    }
+  }
+  m_category = std::move(category);
 }
 
 PropertyKey Style::GetCategoryName() const noexcept {

@@ -190,7 +190,9 @@ public:
     m_ownerPropertyKey = ownerPropertyKey;
   }
   /// Binds the style to the registered category `name`; on any failure the
-  /// previous category stays. Never throws.
+  /// previous category stays. Own values for which the new category has no
+  /// behaviour of the same kind are destroyed, as nothing could free them
+  /// later. Never throws.
   void SetCategory(const PropertyKey& name);
   ///@{
 
