@@ -79,7 +79,8 @@ private:
 inline double Number(const ZelUtils::Any& value) { return value.Get<double>(); }
 
 // Checks that every single substyle below `style` names its holder and key as
-// owner, while list elements have none; returns how many substyles it saw.
+// owner, while list elements have none; returns how many substyles it saw
+// (null list elements not counted).
 inline int CheckOwnerLinks(const Style& style) {
   int seen = 0;
   for (const auto& [key, value] : style.GetProperties()) {
@@ -89,6 +90,8 @@ inline int CheckOwnerLinks(const Style& style) {
       seen += 1 + CheckOwnerLinks(**substyle);
     } else if (const auto* list = value.GetIf<std::vector<Style*>>()) {
       for (const Style* element : *list) {
+        if (!element)
+          continue;
         EXPECT_EQ(element->GetOwner(), nullptr);
         seen += 1 + CheckOwnerLinks(*element);
       }
