@@ -2,32 +2,54 @@
 BUILD_DIR      ?= build
 ASAN_BUILD_DIR ?= build-asan
 BENCH_BUILD_DIR ?= build-bench
+DOCS_BUILD_DIR := build-docs
+FUZZ_BUILD_DIR ?= build-fuzz
+FUZZ_SECONDS   ?= 60
+FUZZ_CXX       ?= clang++
 BUILD_TYPE     ?= RelWithDebInfo
 JOBS           ?= $(shell nproc 2>/dev/null || echo 2)
 WERROR         ?= OFF
 PREFIX         ?= /usr/local
 
-# Debian packages the build needs.
+# Debian packages the build needs; the reference needs only its own, which
+# `make docs` (or `make deps DOCS=1`) installs.
 PACKAGES := cmake make g++ pkg-config rapidjson-dev libicu-dev libgtest-dev libbenchmark-dev libcli11-dev
+DOCS_PACKAGES := doxygen
+# And those that fuzzing needs, installed only with FUZZ=1 (`make fuzz` asks).
+FUZZ_PACKAGES := clang libfuzzer-14-dev libclang-rt-14-dev
+ifeq ($(FUZZ),1)
+PACKAGES += $(FUZZ_PACKAGES)
+endif
+FUZZ_TARGETS := FuzzJsonParse FuzzImport FuzzTextStream FuzzValidate FuzzNames
+
+# The project version, shown in the reference.
+VERSION := $(shell sed -n 's/^project.Styles VERSION \([0-9.]*\).*/\1/p' CMakeLists.txt)
 
 CMAKE_FLAGS := -DCMAKE_BUILD_TYPE=$(BUILD_TYPE) -DSTYLES_WARNINGS_AS_ERRORS=$(WERROR)
 
-.PHONY: all deps configure build test test-asan bench demo install format clean
+.PHONY: all deps docs-deps configure build test test-asan bench fuzz demo docs install format clean
 
 all: build
 
 # Installs the missing Debian packages: one apt-get update, then one install.
-deps:
+define install-missing
 	@missing=""; \
-	for p in $(PACKAGES); do \
+	for p in $(1); do \
 	  dpkg-query -W -f='$${Status}' $$p 2>/dev/null | grep -q "install ok installed" || missing="$$missing $$p"; \
 	done; \
 	if [ -n "$$missing" ]; then \
 	  echo "Installing:$$missing"; \
 	  apt-get update && DEBIAN_FRONTEND=noninteractive apt-get install -y --no-install-recommends $$missing; \
 	else \
-	  echo "All build dependencies are installed."; \
+	  echo "All $(2) are installed."; \
 	fi
+endef
+
+deps:
+	$(call install-missing,$(PACKAGES) $(if $(DOCS),$(DOCS_PACKAGES)),build dependencies)
+
+docs-deps:
+	$(call install-missing,$(DOCS_PACKAGES),documentation dependencies)
 
 configure: deps
 	cmake -S . -B $(BUILD_DIR) $(CMAKE_FLAGS)
@@ -52,14 +74,52 @@ bench: deps
 	cmake --build $(BENCH_BUILD_DIR) -j $(JOBS)
 	for b in $(BENCH_BUILD_DIR)/benchmarks/Benchmark*; do [ -x "$$b" ] && "$$b" || exit 1; done
 
+# Builds the libFuzzer targets with clang, ASan and UBSan, and runs each for
+# FUZZ_SECONDS on a copy of its seed corpus. A crash, leak, sanitizer report,
+# unit slower than 2 s or memory beyond 2 GB fails it; libFuzzer keeps the
+# input in $(FUZZ_BUILD_DIR)/artifacts/.
+fuzz:
+	$(MAKE) deps FUZZ=1
+	cmake -S . -B $(FUZZ_BUILD_DIR) -DCMAKE_CXX_COMPILER=$(FUZZ_CXX) -DCMAKE_BUILD_TYPE=Debug \
+	  -DSTYLES_BUILD_FUZZERS=ON -DSTYLES_BUILD_TESTS=OFF -DSTYLES_BUILD_EXAMPLES=OFF \
+	  -DSTYLES_BUILD_TOOLS=OFF -DSTYLES_INSTALL=OFF -DSTYLES_WARNINGS_AS_ERRORS=$(WERROR)
+	cmake --build $(FUZZ_BUILD_DIR) -j $(JOBS)
+	@for t in $(FUZZ_TARGETS); do \
+	  mkdir -p $(FUZZ_BUILD_DIR)/corpus/$$t $(FUZZ_BUILD_DIR)/artifacts/$$t; \
+	  dict=""; case $$t in FuzzJsonParse|FuzzImport|FuzzValidate) dict="-dict=fuzz/json.dict";; esac; \
+	  echo "== $$t for $(FUZZ_SECONDS) s"; \
+	  UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1 ASAN_OPTIONS=detect_leaks=1 \
+	  $(FUZZ_BUILD_DIR)/fuzz/$$t $(FUZZ_BUILD_DIR)/corpus/$$t fuzz/corpus/$$t $$dict \
+	    -max_total_time=$(FUZZ_SECONDS) -rss_limit_mb=2048 -timeout=2 -print_final_stats=1 \
+	    -artifact_prefix=$(FUZZ_BUILD_DIR)/artifacts/$$t/ \
+	    > $(FUZZ_BUILD_DIR)/$$t.log 2>&1; status=$$?; \
+	  grep -E '^stat::number_of_executed_units|^Done' $(FUZZ_BUILD_DIR)/$$t.log; \
+	  if [ $$status -ne 0 ]; then \
+	    tail -n 60 $(FUZZ_BUILD_DIR)/$$t.log; \
+	    echo "$$t failed; input kept in $(FUZZ_BUILD_DIR)/artifacts/$$t/"; exit 1; \
+	  fi; \
+	done
+
 demo: build
 	$(BUILD_DIR)/examples/WordProcessorDemo
+
+# The API reference in $(DOCS_BUILD_DIR)/html/, from the public headers and
+# docs/. Doxygen fails on any warning (an undocumented public member, a broken
+# reference); a qualified name in backticks that links nowhere fails too.
+docs: docs-deps
+	rm -rf $(DOCS_BUILD_DIR)
+	STYLES_VERSION=$(VERSION) doxygen docs/Doxyfile
+	@if grep -o -E '<code>(Styles|Zel[A-Za-z]*|Json|SystemIO)::[^<]*</code>' \
+	    $(DOCS_BUILD_DIR)/html/*.html | grep -v '^$(DOCS_BUILD_DIR)/html/index.html:'; then \
+	  echo "docs: the names above link to nothing in the reference"; exit 1; \
+	fi
+	@echo "Reference: $(DOCS_BUILD_DIR)/html/index.html"
 
 install: build
 	cmake --install $(BUILD_DIR) --prefix $(PREFIX)
 
 format:
-	find Engines tests benchmarks examples -name '*.h' -o -name '*.cpp' | xargs clang-format -i
+	find Engines tests benchmarks examples fuzz -name '*.h' -o -name '*.cpp' | xargs clang-format -i
 
 clean:
-	rm -rf $(BUILD_DIR) $(ASAN_BUILD_DIR) $(BENCH_BUILD_DIR)
+	rm -rf $(BUILD_DIR) $(ASAN_BUILD_DIR) $(BENCH_BUILD_DIR) $(DOCS_BUILD_DIR) $(FUZZ_BUILD_DIR)

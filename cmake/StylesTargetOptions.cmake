@@ -15,6 +15,13 @@ function(styles_target_options target)
       -O1 -fsanitize=address,undefined -fno-sanitize-recover=undefined -fno-omit-frame-pointer)
     target_link_options(${target} PRIVATE -fsanitize=address,undefined)
   endif()
+  if(STYLES_BUILD_FUZZERS)
+    # Coverage for libFuzzer everywhere; only the fuzz targets link its main.
+    target_compile_options(${target} PRIVATE -O1 -fsanitize=fuzzer-no-link,address,undefined
+      -fno-sanitize-recover=undefined -fno-omit-frame-pointer
+      -fsanitize-ignorelist=${PROJECT_SOURCE_DIR}/fuzz/sanitizer-ignorelist.txt)
+    target_link_options(${target} PRIVATE -fsanitize=address,undefined)
+  endif()
 endfunction()
 
 # A shared library with hidden symbols, an export macro switched on by

@@ -13,9 +13,12 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <chrono>
 #include <climits>
+#include <functional>
 #include <memory>
 #include <random>
+#include <set>
 #include <string>
 #include <typeinfo>
 #include <vector>
@@ -86,6 +89,7 @@ protected:
     RegisterSubstyleSet(kParagraph, kCharacter);
     manager.RegisterProperty(kParagraph, kRuns, new StyleArrayProperty(kCharacter));
     manager.RegisterProperty(kCharacter, kNested, new StyleSetProperty(kCharacter));
+    manager.RegisterProperty(kCharacter, kRuns, new StyleArrayProperty(kCharacter));
     DestroyedTags().clear();
   }
   void TearDown() override {
@@ -611,6 +615,202 @@ TEST_F(StyleSheetTest, DamagedDocuments) {
     if (!c.accepted) {
       EXPECT_EQ(Export(sheet), before);
       EXPECT_EQ(sheet.GetVersion(), 7);
+    }
+  }
+}
+
+// Documents built to hurt, each read into a sheet holding a style it
+// replaces. Whatever the outcome, the sheet has no parent cycle, the pool has
+// not grown, the export reads back to the same text, and deleting every other
+// style, flattening one and destroying the sheet are sound. Sized rows also
+// run at an eighth of their size: time must grow about linearly.
+TEST_F(StyleSheetTest, HostileDocuments) {
+  enum class Outcome { Accepted, Rejected, Throws };
+  const auto num = [](int i) { return Text::FormatInternal("%d", i).GetStdString(); };
+  const auto exercise = [](const Text& document) {
+    StyleSheet sheet;
+    sheet.AddStyle(u"Keep", MakeStyle(u"keep"), false);
+    const std::size_t pooled = StringPool::Get().GetSize();
+    Outcome outcome = Outcome::Throws;
+    try {
+      outcome = sheet.ImportFromString(document, true) ? Outcome::Accepted : Outcome::Rejected;
+    } catch (const std::exception&) {
+    }
+    EXPECT_EQ(StringPool::Get().GetSize(), pooled);
+    std::set<const Style*> acyclic; // styles whose ancestors end
+    const std::size_t count = sheet.GetStyles().size();
+    for (const Style* style : sheet.GetStyles()) {
+      std::vector<const Style*> line;
+      for (; style && !acyclic.count(style) && line.size() <= count; style = style->GetParent())
+        line.push_back(style);
+      EXPECT_LE(line.size(), count) << "parent cycle";
+      acyclic.insert(line.begin(), line.end());
+    }
+    // Styles that an exception left without a category are written under ""
+    // and not read back; one more round trip must then change nothing.
+    Text text = Export(sheet);
+    for (int round = outcome == Outcome::Throws ? 0 : 1; round < 2; ++round) {
+      StyleSheet copy;
+      EXPECT_TRUE(copy.ImportFromString(text, true));
+      const Text before = text;
+      text = Export(copy);
+      EXPECT_TRUE(round == 0 || text == before);
+    }
+    std::vector<Style*> doomed, styles = sheet.GetStyles();
+    for (std::size_t i = 0; i < styles.size(); i += 2)
+      doomed.push_back(styles[i]);
+    sheet.DeleteStyles(StyleSpan(doomed, false));
+    try {
+      if (!sheet.GetStyles().empty())
+        sheet.GetStyles().back()->Flatten();
+    } catch (const std::exception&) {
+      // A lookup that ends in a category without the key may throw.
+    }
+    Export(sheet);
+    return outcome;
+  };
+  const auto paragraphs = [](const std::u16string& members) {
+    return Text(u"{\"sheetTestParagraph\": {" + members + u"}}");
+  };
+  struct Row {
+    const char* label;
+    int size; // 0 for a fixed document
+    std::function<Text(int)> document;
+    Outcome expected;
+  };
+  const Row rows[] = {
+      {"substyles to the nesting limit through sets and lists", 0,
+       [](int) {
+         std::u16string open, close;
+         for (int depth = 3, list = 0; depth + 1 + list <= Json::kMaxDepth; list = !list) {
+           depth += 1 + list;
+           open += list ? u"\"runs\": [{" : u"\"nested\": {";
+           close = (list ? u"}]" : u"}") + close;
+         }
+         return Text(u"{\"sheetTestCharacter\": {\"C\": {" + open + close + u"}}}");
+       },
+       Outcome::Accepted},
+      {"substyles inheriting along long chains", 50000,
+       [&](int n) {
+         std::u16string characters = u"\"C0\": {\"size\": \"5\"}", paragraphs;
+         for (int i = 1; i < n; ++i)
+           characters += u", \"C" + num(i) + u"\": {\"inherits\": \"C" + num(i - 1) + u"\"}";
+         for (int i = 0; i < n; ++i)
+           paragraphs += (i ? u", \"P" + num(i) + u"\": {\"inherits\": \"P" + num(i - 1) + u"\", "
+                            : u"\"P0\": {") +
+                         u"\"sheetTestCharacter\": {" +
+                         (i ? u"" : u"\"inherits\": \"C" + num(n - 1) + u"\"") + u"}}";
+         return Text(u"{\"sheetTestCharacter\": {" + characters + u"}, \"sheetTestParagraph\": {" +
+                     paragraphs + u"}}");
+       },
+       Outcome::Accepted},
+      {"one style with 100,000 members, most unknown", 100000,
+       [&](int n) {
+         std::u16string members = u"\"size\": \"0\"";
+         for (int i = 1; i < n; ++i)
+           members += (i % 100 ? u", \"unknown" : u", \"size") + std::u16string(u"\": \"") +
+                      num(i) + u"\"";
+         return paragraphs(u"\"Wide\": {" + members + u"}");
+       },
+       Outcome::Accepted},
+      {"names of a million characters", 1000000,
+       [&](int n) {
+         const std::u16string a(n, u'N'), b(n, u'M');
+         return paragraphs(u"\"" + a + u"\": {\"size\": \"1\"}, \"" + b + u"\": {\"inherits\": \"" +
+                           a + u"\"}");
+       },
+       Outcome::Accepted},
+      {"100,000 names differing only in letter case", 100000,
+       [&](int n) {
+         std::u16string members;
+         for (int i = 0; i < n; ++i) {
+           std::u16string name = u"abcdefghijklmnopq";
+           for (int bit = 0; bit < 17; ++bit)
+             if (i >> bit & 1)
+               name[bit] = static_cast<char16_t>(name[bit] - u'a' + u'A');
+           members += (i ? u", \"" : u"\"") + name + u"\": {\"inherits\": \"ABCDEFGHIJKLMNOPQ\"," +
+                      u"\"sheetTestCharacter\": {\"inherits\": \"" + name + u"\"}}";
+         }
+         return paragraphs(members);
+       },
+       Outcome::Accepted},
+      {"inherits cycles across categories and through substyles", 50000,
+       [&](int n) {
+         std::u16string p, c;
+         for (int i = 0; i < n; ++i) {
+           const std::u16string sep = i ? u", " : u"";
+           p += sep + u"\"S" + num(i) + u"\": {\"inherits\": \"T" + num(i) +
+                u"\", \"sheetTestCharacter\": {\"inherits\": \"S" + num((i + 1) % n) + u"\"}}";
+           c += sep + u"\"T" + num(i) + u"\": {\"inherits\": \"S" + num((i + 1) % n) +
+                u"\", \"nested\": {\"inherits\": \"T" + num(i) + u"\"}}";
+         }
+         return Text(u"{\"sheetTestParagraph\": {" + p + u"}, \"sheetTestCharacter\": {" + c +
+                     u"}}");
+       },
+       Outcome::Accepted},
+      {"substyles inheriting the styles that hold them", 0,
+       [&](int) {
+         return paragraphs(uR"("A": {"sheetTestCharacter": {"inherits": "B"},)"
+                           uR"( "runs": [{"inherits": "A"}]}, "B": {"inherits": "A"})");
+       },
+       Outcome::Accepted},
+      {"substyles inheriting each other's holders", 0,
+       [&](int) {
+         return Text(uR"({"sheetTestCharacter": {"R1": {"nested": {"inherits": "R2"}},)"
+                     uR"( "R2": {"nested": {"inherits": "R1"}}}})");
+       },
+       Outcome::Accepted},
+      {"numbers at the edges of double range", 0,
+       [&](int) {
+         return paragraphs(uR"("A": {"size": 1.7976931348623157e308, "font": -4.9e-324,)"
+                           uR"( "sheetTestCharacter": {"size": -0}})");
+       },
+       Outcome::Accepted},
+      {"a number beyond double range", 0,
+       [&](int) { return paragraphs(uR"("A": {"size": 1e309})"); }, Outcome::Rejected},
+      {"a refused value in a substyle", 0,
+       [&](int) {
+         return paragraphs(uR"("A": {"size": "2", "sheetTestCharacter": {"size": "1e309"}},)"
+                           uR"( "Keep": {"inherits": "A"})");
+       },
+       Outcome::Throws},
+      {"NaN in a list", 0,
+       [&](int) { return paragraphs(uR"("A": {"runs": [{}, {"size": "NaN"}]}, "B": {})"); },
+       Outcome::Throws},
+      {"escaped and raw astral names are one", 0,
+       [&](int) {
+         return paragraphs(u"\"\\ud83d\\ude00\": {\"font\": \"\\ud83d\\ude00\"}, "
+                           u"\"\U0001F600\": {\"inherits\": \"\U0001F600x\"}, \"\U0001F600x\": {}");
+       },
+       Outcome::Accepted},
+      {"escaped lone surrogate in a name", 0, [&](int) { return paragraphs(u"\"\\ud800x\": {}"); },
+       Outcome::Rejected},
+      {"escaped lone surrogate in a value", 0,
+       [&](int) { return paragraphs(u"\"A\": {\"font\": \"\\udc00\"}"); }, Outcome::Rejected},
+      {"raw lone surrogate in a name", 0, [&](int) { return paragraphs(u"\"\xD800\": {}"); },
+       Outcome::Rejected},
+      {"NUL inside a name", 0,
+       [&](int) { return paragraphs(uR"("a\u0000b": {"inherits": "a"}, "a": {})"); },
+       Outcome::Accepted},
+  };
+  using Clock = std::chrono::steady_clock;
+  for (const Row& row : rows) {
+    SCOPED_TRACE(row.label);
+    // An eighth of the size first, twice, then the full size: the bound
+    // allows for caches that the larger documents outgrow, not for time
+    // growing with the square of the size.
+    Clock::duration least = Clock::duration::max();
+    for (int run = 0; row.size && run < 2; ++run) {
+      const Text eighth = row.document(row.size / 8);
+      const Clock::time_point begin = Clock::now();
+      exercise(eighth);
+      least = std::min(least, Clock::now() - begin);
+    }
+    const Text document = row.document(row.size);
+    const Clock::time_point start = Clock::now();
+    EXPECT_EQ(exercise(document), row.expected);
+    if (row.size) {
+      EXPECT_LT(Clock::now() - start, 48 * least + std::chrono::seconds(1));
     }
   }
 }

@@ -97,14 +97,36 @@ ZelStringT<char16_t> Widen(std::string_view ascii) {
 // The reader validates the text's UTF-16, and an escaped lone surrogate
 // trips one of its checks, so no handler sees an unpaired surrogate.
 
+// The number events of the reader's handlers, for a Handler with Number and
+// Fail. Numbers arrive as text (the reader checked their syntax) and are
+// converted in RawNumber; the other number events never come.
+template <class Handler> class NumberEvents {
+public:
+  using Ch = char16_t;
+  bool Int(int number) { return Self().Number(number); }
+  bool Uint(unsigned number) { return Self().Number(number); }
+  bool Int64(std::int64_t number) { return Self().Number(static_cast<double>(number)); }
+  bool Uint64(std::uint64_t number) { return Self().Number(static_cast<double>(number)); }
+  bool Double(double number) { return Self().Number(number); }
+  bool RawNumber(const Ch* text, SizeType length, bool) {
+    double number = 0;
+    if (!ReadNumber(text, length, number))
+      return Self().Fail("Number too big to be stored in double");
+    return Self().Number(number);
+  }
+
+private:
+  Handler& Self() { return static_cast<Handler&>(*this); }
+};
+
 // SAX handler that builds the value tree. Members of open objects wait on one
 // stack, elements of open arrays on another; each value is built in its slot.
 // When a container closes its children are moved into a vector of exactly
 // their count, so each container allocates once.
-class TreeBuilder {
-public:
-  using Ch = char16_t;
+class TreeBuilder : public NumberEvents<TreeBuilder> {
+  friend class NumberEvents<TreeBuilder>;
 
+public:
   TreeBuilder() { m_inObject.push_back(false); } // the root sits in an array slot
 
   bool Null() {
@@ -114,19 +136,6 @@ public:
   bool Bool(bool flag) {
     NextSlot().Emplace<bool>(flag);
     return true;
-  }
-  // Numbers arrive as text (the reader checked their syntax) and are
-  // converted in RawNumber; the other number events never come.
-  bool Int(int number) { return Number(number); }
-  bool Uint(unsigned number) { return Number(number); }
-  bool Int64(std::int64_t number) { return Number(static_cast<double>(number)); }
-  bool Uint64(std::uint64_t number) { return Number(static_cast<double>(number)); }
-  bool Double(double number) { return Number(number); }
-  bool RawNumber(const Ch* text, SizeType length, bool) {
-    double number = 0;
-    if (!ReadNumber(text, length, number))
-      return Fail("Number too big to be stored in double");
-    return Number(number);
   }
   bool String(const Ch* text, SizeType length, bool) {
     NextSlot().Emplace<ZelStringT<char16_t>>(text, length);
@@ -360,9 +369,10 @@ std::size_t ByteOrderMarkLength(const ZelStringT<char16_t>& text) {
 // SAX handler that builds a Document's nodes. The children of open
 // containers wait on a stack; when a container closes they move, in order,
 // to the end of the final array and the container records where they start.
-class DocumentBuilder {
+class DocumentBuilder : public NumberEvents<DocumentBuilder> {
+  friend class NumberEvents<DocumentBuilder>;
+
 public:
-  using Ch = char16_t;
   using Node = detail::DocumentNode;
 
   explicit DocumentBuilder(std::vector<Node>& nodes) : m_nodes(nodes) {}
@@ -372,17 +382,6 @@ public:
     Node node{Node::kBool, 0, {}};
     node.flag = flag;
     return Push(node);
-  }
-  bool Int(int number) { return Number(number); }
-  bool Uint(unsigned number) { return Number(number); }
-  bool Int64(std::int64_t number) { return Number(static_cast<double>(number)); }
-  bool Uint64(std::uint64_t number) { return Number(static_cast<double>(number)); }
-  bool Double(double number) { return Number(number); }
-  bool RawNumber(const Ch* text, SizeType length, bool) {
-    double number = 0;
-    if (!ReadNumber(text, length, number))
-      return Fail("Number too big to be stored in double");
-    return Number(number);
   }
   bool String(const Ch* text, SizeType length, bool) {
     return Push(Text(Node::kString, text, length));

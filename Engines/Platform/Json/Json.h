@@ -1,8 +1,9 @@
-// Json: the platform's JSON value model and its text form. A Value is one of
-// null, UTF-16 string, Object, number (double), bool, Array or UTF-8 string.
-// Objects keep their members in insertion order and allow repeated names.
-// Parse reads UTF-16 JSON text into a Value; ValueToString writes one back, so
-// that Parse(ValueToString(v, format)) gives v again for either format.
+/// @file
+/// Json: the platform's JSON value model and its text form. A Value is one of
+/// null, UTF-16 string, Object, number (double), bool, Array or UTF-8 string.
+/// Objects keep their members in insertion order and allow repeated names.
+/// Parse reads UTF-16 JSON text into a Value; ValueToString writes one back, so
+/// that Parse(ValueToString(v, format)) gives v again for either format.
 #pragma once
 
 #include <ZelPlatform/Export.h>
@@ -21,12 +22,12 @@
 
 namespace Json {
 
-// Parse rejects text whose objects and arrays nest deeper than this; the
-// limit bounds the work and the stack needed by anything that walks a parsed
-// value recursively.
+/// Parse rejects text whose objects and arrays nest deeper than this; the
+/// limit bounds the work and the stack needed by anything that walks a parsed
+/// value recursively.
 constexpr int kMaxDepth = 512;
 
-// The JSON null; all nulls are equal.
+/// The JSON null; all nulls are equal.
 struct NullType {
   friend bool operator==(NullType, NullType) noexcept { return true; }
   friend bool operator!=(NullType, NullType) noexcept { return false; }
@@ -35,40 +36,65 @@ struct NullType {
 class Value;
 struct Member;
 
-// A JSON object: (name, value) members in insertion order. Repeated names are
-// kept; Find returns the first. Equality compares members in order.
+/// A JSON object: (name, value) members in insertion order. Repeated names are
+/// kept; Find returns the first. Equality compares members in order.
 class Object {
 public:
+  ///@{
+
+  /// Iterator over the members, in order.
   using iterator = std::vector<Member>::iterator;
   using const_iterator = std::vector<Member>::const_iterator;
+  ///@}
 
   Object() noexcept;
+  ///@{
+
+  /// Copies every member deeply; a moved-from object is left empty.
   Object(const Object& other);
   Object(Object&& other) noexcept;
   Object& operator=(const Object& other);
   Object& operator=(Object&& other) noexcept;
+  ///@}
   ~Object();
 
-  // Takes the members as they are, in their order.
+  /// Takes the members as they are, in their order.
   explicit Object(std::vector<Member>&& members) noexcept;
 
+  ///@{
+
+  /// The number of members, repeated names included.
   std::size_t GetSize() const noexcept;
   bool IsEmpty() const noexcept;
-  // Name and value of member i; i must be below GetSize().
+  ///@}
+
+  ///@{
+
+  /// Name and value of member i; i must be below GetSize().
   const ZelStringT<char16_t>& GetValueName(std::size_t i) const;
   const Value& GetValue(std::size_t i) const;
   Value& GetValue(std::size_t i);
-  // Appends a member after the existing ones, even when the name is taken.
+  ///@}
+
+  /// Appends a member after the existing ones, even when the name is taken.
   void AddValue(ZelStringT<char16_t> name, Value value);
+  /// Makes room for `count` members in all: a hint, never needed.
   void Reserve(std::size_t count);
-  // The value of the first member called name, or null; not owned.
+  ///@{
+
+  /// The value of the first member called name, or null; not owned.
   const Value* Find(std::u16string_view name) const noexcept;
   Value* Find(std::u16string_view name) noexcept;
+  ///@}
 
+  ///@{
+
+  /// The members in order, as Member structures.
   iterator begin() noexcept;
   iterator end() noexcept;
   const_iterator begin() const noexcept;
   const_iterator end() const noexcept;
+  ///@}
 
   friend bool operator==(const Object& a, const Object& b);
   friend bool operator!=(const Object& a, const Object& b);
@@ -77,34 +103,57 @@ private:
   std::vector<Member> m_members;
 };
 
-// A JSON array: values in order. Equality compares element by element.
+/// A JSON array: values in order. Equality compares element by element.
 class Array {
 public:
+  ///@{
+
+  /// Iterator over the values, in order.
   using iterator = std::vector<Value>::iterator;
   using const_iterator = std::vector<Value>::const_iterator;
+  ///@}
 
   Array() noexcept;
+  ///@{
+
+  /// Copies every value deeply; a moved-from array is left empty.
   Array(const Array& other);
   Array(Array&& other) noexcept;
   Array& operator=(const Array& other);
   Array& operator=(Array&& other) noexcept;
+  ///@}
   ~Array();
 
-  // Takes the values as they are, in their order.
+  /// Takes the values as they are, in their order.
   explicit Array(std::vector<Value>&& values) noexcept;
 
+  ///@{
+
+  /// The number of values.
   std::size_t GetSize() const noexcept;
   bool IsEmpty() const noexcept;
-  // Value i; i must be below GetSize().
+  ///@}
+
+  ///@{
+
+  /// Value i; i must be below GetSize().
   const Value& GetValue(std::size_t i) const;
   Value& GetValue(std::size_t i);
+  ///@}
+
+  /// Appends `value` after the existing ones.
   void AddValue(Value value);
+  /// Makes room for `count` values in all: a hint, never needed.
   void Reserve(std::size_t count);
 
+  ///@{
+
+  /// The values in order.
   iterator begin() noexcept;
   iterator end() noexcept;
   const_iterator begin() const noexcept;
   const_iterator end() const noexcept;
+  ///@}
 
   friend bool operator==(const Array& a, const Array& b);
   friend bool operator!=(const Array& a, const Array& b);
@@ -122,36 +171,44 @@ constexpr bool kIsNumber =
     !std::is_same<T, char16_t>::value && !std::is_same<T, char32_t>::value;
 } // namespace detail
 
+/// The kinds a Value can hold, in their Index() order.
 using ValueBase = ZelUtils::Variant<NullType, ZelStringT<char16_t>, Object, double, bool, Array,
                                     ZelStringT<char>>;
 
-// One JSON value; a default-constructed value is null. Every number is held as
-// a double. ZelStringT<char> holds UTF-8 text and is written as a string.
-// Get<T>() throws std::bad_cast when another kind is held.
+/// One JSON value; a default-constructed value is null. Every number is held as
+/// a double. ZelStringT<char> holds UTF-8 text and is written as a string.
+/// Get<T>() throws std::bad_cast when another kind is held.
 class Value : public ValueBase {
 public:
   Value() = default;
+  /// The null value.
   Value(NullType) noexcept {}
   Value(std::nullptr_t) = delete;
+  ///@{
+
+  /// Holds the text, object or array; implicit, so that values read like JSON.
   Value(const char16_t* text) : ValueBase(ZelStringT<char16_t>(text)) {}
   Value(ZelStringT<char16_t> text) noexcept : ValueBase(std::move(text)) {}
   Value(ZelStringT<char> utf8Text) noexcept : ValueBase(std::move(utf8Text)) {}
   Value(Object object) noexcept : ValueBase(std::move(object)) {}
   Value(Array array) noexcept : ValueBase(std::move(array)) {}
-  // Any integer or floating-point number becomes a double.
+  ///@}
+
+  /// Any integer or floating-point number becomes a double.
   template <class T, std::enable_if_t<detail::kIsNumber<T>, int> = 0>
   Value(T number) noexcept : ValueBase(static_cast<double>(number)) {}
-  // Only a real bool; pointers and numbers never turn into one.
+  /// Only a real bool; pointers and numbers never turn into one.
   template <class T, std::enable_if_t<std::is_same<T, bool>::value, int> = 0>
   Value(T flag) noexcept : ValueBase(flag) {}
 
+  /// True for the null value.
   bool IsNull() const noexcept { return Is<NullType>(); }
 };
 
-// One member of an Object.
+/// One member of an Object.
 struct Member {
-  ZelStringT<char16_t> name;
-  Value value;
+  ZelStringT<char16_t> name; ///< The member's name, as written.
+  Value value;               ///< The member's value.
 
   friend bool operator==(const Member& a, const Member& b) {
     return a.name == b.name && a.value == b.value;
@@ -159,21 +216,21 @@ struct Member {
   friend bool operator!=(const Member& a, const Member& b) { return !(a == b); }
 };
 
-// Parses the whole of text as one JSON value into out. Returns false for text
-// that is not exactly one valid JSON value (trailing text, unpaired surrogates,
-// nesting deeper than kMaxDepth, a number too big for a double); then out is
-// unchanged and errorText holds a message with the offset in code units. Does
-// not throw for bad text. Numbers are correctly rounded; one too small for a
-// double becomes zero of its sign. A leading byte order mark (U+FEFF) is
-// skipped. On success errorText is cleared.
+/// Parses the whole of text as one JSON value into out. Returns false for text
+/// that is not exactly one valid JSON value (trailing text, unpaired surrogates,
+/// nesting deeper than kMaxDepth, a number too big for a double); then out is
+/// unchanged and errorText holds a message with the offset in code units. Does
+/// not throw for bad text. Numbers are correctly rounded; one too small for a
+/// double becomes zero of its sign. A leading byte order mark (U+FEFF) is
+/// skipped. On success errorText is cleared.
 ZEL_API bool Parse(const ZelStringT<char16_t>& text, Value& out, ZelStringT<char16_t>& errorText);
 
-// The JSON text of value: compact when format is false, indented by two spaces
-// per level when true. Numbers are written in the shortest form that reads back
-// to the same double (integers without fraction, -0 as "-0.0"); NaN and
-// infinities are written as null; unpaired surrogates in strings become
-// U+FFFD and invalid UTF-8 in ZelStringT<char> values does too. Returns an
-// empty string if the text cannot be produced.
+/// The JSON text of value: compact when format is false, indented by two spaces
+/// per level when true. Numbers are written in the shortest form that reads back
+/// to the same double (integers without fraction, -0 as "-0.0"); NaN and
+/// infinities are written as null; unpaired surrogates in strings become
+/// U+FFFD and invalid UTF-8 in ZelStringT<char> values does too. Returns an
+/// empty string if the text cannot be produced.
 ZEL_API ZelStringT<char16_t> ValueToString(const Value& value, bool format);
 
 namespace detail {
@@ -191,31 +248,40 @@ struct DocumentNode {
 };
 } // namespace detail
 
-// A JSON text parsed once into a compact, read-only form: the values sit in
-// one array and the strings point into the document's own copy of the text,
-// so reading even a large text takes a handful of allocations instead of
-// several per value. Parse accepts and rejects exactly what Json::Parse
-// does, with the same messages; ToValue turns any part into an ordinary Value.
+/// A JSON text parsed once into a compact, read-only form: the values sit in
+/// one array and the strings point into the document's own copy of the text,
+/// so reading even a large text takes a handful of allocations instead of
+/// several per value. Parse accepts and rejects exactly what Json::Parse
+/// does, with the same messages; ToValue turns any part into an ordinary Value.
 class ZEL_API Document {
 public:
-  // A value inside a document; valid while the document lives unchanged.
+  /// A value inside a document; valid while the document lives unchanged.
   class Ref {
   public:
+    ///@{
+
+    /// The kind of the value.
     bool IsNull() const noexcept { return m_node->kind == Node::kNull; }
     bool IsString() const noexcept { return m_node->kind == Node::kString; }
     bool IsNumber() const noexcept { return m_node->kind == Node::kNumber; }
     bool IsBool() const noexcept { return m_node->kind == Node::kBool; }
     bool IsObject() const noexcept { return m_node->kind == Node::kObject; }
     bool IsArray() const noexcept { return m_node->kind == Node::kArray; }
-    // The text of a string; empty for other kinds.
+    ///@}
+
+    /// The text of a string; empty for other kinds.
     std::u16string_view GetString() const noexcept {
       return IsString() ? std::u16string_view(m_node->text, m_node->size) : std::u16string_view();
     }
+    /// The number; 0 for other kinds.
     double GetNumber() const noexcept { return IsNumber() ? m_node->number : 0.0; }
+    /// The flag; false for other kinds.
     bool GetBool() const noexcept { return IsBool() && m_node->flag; }
-    // The number of members of an object or elements of an array; else 0.
+    /// The number of members of an object or elements of an array; else 0.
     std::size_t GetSize() const noexcept { return IsObject() || IsArray() ? m_node->size : 0; }
-    // Member i of an object (i below GetSize()).
+    ///@{
+
+    /// Member i of an object (i below GetSize()).
     std::u16string_view GetMemberName(std::size_t i) const noexcept {
       const Node& name = m_nodes[m_node->first + 2 * i];
       return std::u16string_view(name.text, name.size);
@@ -223,13 +289,15 @@ public:
     Ref GetMember(std::size_t i) const noexcept {
       return Ref(m_nodes, &m_nodes[m_node->first + 2 * i + 1]);
     }
-    // Element i of an array (i below GetSize()).
+    ///@}
+
+    /// Element i of an array (i below GetSize()).
     Ref GetElement(std::size_t i) const noexcept {
       return Ref(m_nodes, &m_nodes[m_node->first + i]);
     }
-    // An owning copy of this value and everything in it.
+    /// An owning copy of this value and everything in it.
     ZEL_API Value ToValue() const;
-    // Makes `out` this value, reusing the storage of a string it holds.
+    /// Makes `out` this value, reusing the storage of a string it holds.
     ZEL_API void AssignTo(Value& out) const;
 
   private:
@@ -246,10 +314,10 @@ public:
   Document(const Document&) = delete;
   Document& operator=(const Document&) = delete;
 
-  // Parses the whole of `text`; on failure the document is empty (its root
-  // is null) and `errorText` says why, as Json::Parse would.
+  /// Parses the whole of `text`; on failure the document is empty (its root
+  /// is null) and `errorText` says why, as Json::Parse would.
   bool Parse(const ZelStringT<char16_t>& text, ZelStringT<char16_t>& errorText);
-  // The parsed value; null before a successful Parse.
+  /// The parsed value; null before a successful Parse.
   Ref GetRoot() const noexcept { return Ref(m_nodes.data(), &m_nodes.back()); }
 
 private:
@@ -257,30 +325,36 @@ private:
   std::vector<detail::DocumentNode> m_nodes; // children before parents; the root last
 };
 
-// Writes JSON text piece by piece, in the layouts of ValueToString, without
-// building a value tree first: a sheet writes its document through it. Each
-// call returns false once any piece has failed; the text is then lost.
+/// Writes JSON text piece by piece, in the layouts of ValueToString, without
+/// building a value tree first: a sheet writes its document through it. Each
+/// call returns false once any piece has failed; the text is then lost.
 class ZEL_API Writer {
 public:
-  // Compact text, or indented by two spaces per level when `format` is true.
+  /// Compact text, or indented by two spaces per level when `format` is true.
   explicit Writer(bool format);
   ~Writer();
   Writer(const Writer&) = delete;
   Writer& operator=(const Writer&) = delete;
 
+  ///@{
+
+  /// Opens or closes an object or an array.
   bool StartObject();
   bool EndObject();
   bool StartArray();
   bool EndArray();
-  // A member name; the member's value follows.
+  ///@}
+
+  /// A member name; the member's value follows.
   bool Key(std::u16string_view name);
+  /// A string value.
   bool String(std::u16string_view text);
-  // A whole value, containers included, as ValueToString writes it.
+  /// A whole value, containers included, as ValueToString writes it.
   bool Write(const Value& value);
-  // Makes room for `units` more UTF-16 units of text: a hint, never needed.
+  /// Makes room for `units` more UTF-16 units of text: a hint, never needed.
   void Reserve(std::size_t units);
-  // The text once every container is closed; empty when a piece failed or
-  // the text is incomplete.
+  /// The text once every container is closed; empty when a piece failed or
+  /// the text is incomplete.
   ZelStringT<char16_t> TakeText();
 
   struct Impl;
@@ -332,8 +406,12 @@ inline Object::iterator Object::begin() noexcept { return m_members.begin(); }
 inline Object::iterator Object::end() noexcept { return m_members.end(); }
 inline Object::const_iterator Object::begin() const noexcept { return m_members.begin(); }
 inline Object::const_iterator Object::end() const noexcept { return m_members.end(); }
+///@{
+
+/// Equal when the members are equal one by one, in order.
 inline bool operator==(const Object& a, const Object& b) { return a.m_members == b.m_members; }
 inline bool operator!=(const Object& a, const Object& b) { return !(a == b); }
+///@}
 
 inline Array::Array() noexcept = default;
 inline Array::Array(const Array& other) = default;
@@ -359,7 +437,11 @@ inline Array::iterator Array::begin() noexcept { return m_values.begin(); }
 inline Array::iterator Array::end() noexcept { return m_values.end(); }
 inline Array::const_iterator Array::begin() const noexcept { return m_values.begin(); }
 inline Array::const_iterator Array::end() const noexcept { return m_values.end(); }
+///@{
+
+/// Equal when the values are equal one by one, in order.
 inline bool operator==(const Array& a, const Array& b) { return a.m_values == b.m_values; }
 inline bool operator!=(const Array& a, const Array& b) { return !(a == b); }
+///@}
 
 } // namespace Json

@@ -1,7 +1,8 @@
-// The platform string: ZelStringT<CharT> wraps a standard string and adds the
-// operations the style library needs (exact and case-insensitive comparison,
-// trimming of Unicode white space, printf-style number formatting).
-// ZelStringT<char16_t> holds UTF-16; ZelStringT<char> holds UTF-8.
+/// @file
+/// The platform string: ZelStringT<CharT> wraps a standard string and adds the
+/// operations the style library needs (exact and case-insensitive comparison,
+/// trimming of Unicode white space, printf-style number formatting).
+/// ZelStringT<char16_t> holds UTF-16; ZelStringT<char> holds UTF-8.
 #pragma once
 
 #include <ZelPlatform/Export.h>
@@ -12,12 +13,13 @@
 #include <string_view>
 #include <utility>
 
+/// A read-only view of the text of a ZelStringT of the same character type.
 template <class CharT> using ZelStringViewT = std::basic_string_view<CharT>;
 
 namespace ZelPlatform {
-// UTF-8 to UTF-16; each ill-formed sequence becomes one U+FFFD.
+/// UTF-8 to UTF-16; each ill-formed sequence becomes one U+FFFD.
 ZEL_API std::u16string Utf8ToUtf16(std::string_view text);
-// UTF-16 to UTF-8; unpaired surrogates become U+FFFD.
+/// UTF-16 to UTF-8; unpaired surrogates become U+FFFD.
 ZEL_API std::string Utf16ToUtf8(std::u16string_view text);
 
 namespace detail {
@@ -49,37 +51,55 @@ void ReplaceUnpairedSurrogates(std::u16string_view text, std::u16string& out);
 } // namespace detail
 } // namespace ZelPlatform
 
-// Case mode for ZelStringT::Compare: 0 compares exactly, code unit by code unit.
+/// Case mode for ZelStringT::Compare: 0 compares exactly, code unit by code unit.
 enum CompareCase : int { kCompareCaseSensitive = 0, kCompareCaseInsensitive = 1 };
 
+/// A text of `CharT` code units that owns a standard string; see the file overview.
 template <class CharT> class ZelStringT {
 public:
+  /// The standard string that holds the text.
   using StdString = std::basic_string<CharT>;
+  /// A read-only view of the text.
   using View = std::basic_string_view<CharT>;
 
   ZelStringT() = default;
+  ///@{
+
+  /// Copies the text; implicit on purpose, so that texts, views and standard
+  /// strings convert. A null pointer gives the empty string.
   ZelStringT(const CharT* text) : m_text(text ? text : StdString()) {}
   ZelStringT(const CharT* text, std::size_t length) : m_text(text, length) {}
   ZelStringT(View text) : m_text(text) {}
   ZelStringT(const StdString& text) : m_text(text) {}
   ZelStringT(StdString&& text) noexcept : m_text(std::move(text)) {}
+  ///@}
+
+  /// `count` copies of `c`.
   ZelStringT(std::size_t count, CharT c) : m_text(count, c) {}
 
+  ///@{
+
+  /// The text itself, not a copy; valid until the string changes or goes.
   operator View() const noexcept { return m_text; }
   View GetView() const noexcept { return m_text; }
   const StdString& GetStdString() const noexcept { return m_text; }
   StdString& GetStdString() noexcept { return m_text; }
   const CharT* c_str() const noexcept { return m_text.c_str(); }
   const CharT* data() const noexcept { return m_text.data(); }
+  ///@}
 
+  ///@{
+
+  /// Size and code units, counted in code units, not characters.
   bool IsEmpty() const noexcept { return m_text.empty(); }
   std::size_t GetLength() const noexcept { return m_text.size(); }
   CharT operator[](std::size_t i) const { return m_text[i]; }
   auto begin() const noexcept { return m_text.begin(); }
   auto end() const noexcept { return m_text.end(); }
+  ///@}
 
-  // Case mode 0 compares exactly (code unit order); any other mode ignores
-  // letter case like CompareNoCase. Returns <0, 0 or >0.
+  /// Case mode 0 compares exactly (code unit order); any other mode ignores
+  /// letter case like CompareNoCase. Returns <0, 0 or >0.
   int Compare(View other, int caseMode) const {
     if (caseMode != kCompareCaseSensitive)
       return CompareNoCase(other);
@@ -87,7 +107,7 @@ public:
     return c < 0 ? -1 : (c > 0 ? 1 : 0);
   }
 
-  // Case-insensitive comparison by full Unicode case folding.
+  /// Case-insensitive comparison by full Unicode case folding.
   int CompareNoCase(View other) const {
     if constexpr (sizeof(CharT) == 2)
       return ZelPlatform::detail::CompareNoCaseUtf16(
@@ -99,7 +119,7 @@ public:
           std::string_view(reinterpret_cast<const char*>(other.data()), other.size()));
   }
 
-  // Removes Unicode white space at both ends, in place.
+  /// Removes Unicode white space at both ends, in place.
   ZelStringT& Trim() {
     std::pair<std::size_t, std::size_t> bounds;
     if constexpr (sizeof(CharT) == 2)
@@ -113,12 +133,15 @@ public:
     return *this;
   }
 
-  // printf-style formatting of numbers and ASCII text ("%g", "%d", ...).
+  /// printf-style formatting of numbers and ASCII text (`"%g"`, `"%d"`, ...).
   template <class... Args> static ZelStringT FormatInternal(const char* format, Args... args) {
     const std::string ascii = ZelPlatform::detail::FormatAscii(format, args...);
     return ZelStringT(StdString(ascii.begin(), ascii.end()));
   }
 
+  ///@{
+
+  /// Appends in place.
   ZelStringT& operator+=(View other) {
     m_text.append(other);
     return *this;
@@ -127,6 +150,11 @@ public:
     m_text.push_back(c);
     return *this;
   }
+  ///@}
+
+  ///@{
+
+  /// A new string of both texts; a null text counts as empty.
   friend ZelStringT operator+(const ZelStringT& a, View b) {
     StdString text;
     text.reserve(a.GetLength() + b.size());
@@ -149,10 +177,13 @@ public:
     text += b;
     return text;
   }
+  ///@}
 
-  // Exact comparisons in code unit order. Every mix of ZelStringT with a view,
-  // a standard string or a null-terminated text has its own overload, so that
-  // no call has to choose between two user-defined conversions.
+  ///@{
+
+  /// Exact comparisons in code unit order. Every mix of ZelStringT with a view,
+  /// a standard string or a null-terminated text has its own overload, so that
+  /// no call has to choose between two user-defined conversions.
   friend bool operator==(const ZelStringT& a, const ZelStringT& b) noexcept {
     return a.m_text == b.m_text;
   }
@@ -214,6 +245,7 @@ public:
   friend bool operator<(const CharT* a, const ZelStringT& b) noexcept {
     return NullSafeView(a) < b.GetView();
   }
+  ///@}
 
 private:
   static View NullSafeView(const CharT* text) noexcept { return text ? View(text) : View(); }
@@ -221,7 +253,9 @@ private:
   StdString m_text;
 };
 
+/// Hashes the text, so that strings can key unordered containers.
 template <class CharT> struct std::hash<ZelStringT<CharT>> {
+  /// The standard hash of the text's view.
   std::size_t operator()(const ZelStringT<CharT>& text) const noexcept {
     return std::hash<std::basic_string_view<CharT>>()(text.GetView());
   }

@@ -1,7 +1,8 @@
-// ZelUtils::Any: the type-erased value of every style property. It holds one
-// copyable value of any kind (or nothing), copies deeply, keeps small values
-// inline, and compares values: kinds are identified by their type name so a
-// kind made in a host library and in the style library is the same kind.
+/// @file
+/// ZelUtils::Any: the type-erased value of every style property. It holds one
+/// copyable value of any kind (or nothing), copies deeply, keeps small values
+/// inline, and compares values: kinds are identified by their type name so a
+/// kind made in a host library and in the style library is the same kind.
 #pragma once
 
 #include <ZelPlatform/Export.h>
@@ -97,6 +98,8 @@ using StoredKind =
 
 } // namespace detail
 
+/// One value of any copyable kind, or nothing (the empty value). Copies are
+/// deep; Get and GetIf reach the held value itself, never a copy.
 class Any {
   // Room for a pointer triple or a standard string, so that text values live
   // inline like numbers.
@@ -110,11 +113,15 @@ class Any {
 
 public:
   Any() noexcept {}
+  ///@{
+
+  /// Copies the held value deeply; moving leaves `other` empty.
   Any(const Any& other) : m_ops(nullptr) { CopyFrom(other); }
   Any(Any&& other) noexcept : m_ops(nullptr) { MoveFrom(other); }
+  ///@}
 
-  // Holds a copy of `value`. A UTF-16 literal is held as ZelStringT<char16_t>,
-  // the kind of all text values, rather than as a pointer.
+  /// Holds a copy of `value`. A UTF-16 literal is held as ZelStringT<char16_t>,
+  /// the kind of all text values, rather than as a pointer.
   template <class T, class D = std::decay_t<T>,
             class = std::enable_if_t<!std::is_same<D, Any>::value &&
                                      std::is_copy_constructible<D>::value>>
@@ -124,6 +131,10 @@ public:
 
   ~Any() { Reset(); }
 
+  ///@{
+
+  /// Destroys the held value and holds a deep copy of `other`'s; moving takes
+  /// `other`'s value and leaves it empty. A copy that throws changes nothing.
   Any& operator=(const Any& other) {
     if (this != &other) {
       Any copy(other);
@@ -139,8 +150,10 @@ public:
     }
     return *this;
   }
-  // Same kind: assigns in place; another kind: replaces value and kind. A
-  // UTF-16 literal is held as text, as in the constructor.
+  ///@}
+
+  /// Same kind: assigns in place; another kind: replaces value and kind. A
+  /// UTF-16 literal is held as text, as in the constructor.
   template <class T, class D = std::decay_t<T>,
             class = std::enable_if_t<!std::is_same<D, Any>::value &&
                                      std::is_copy_constructible<D>::value>>
@@ -159,7 +172,9 @@ public:
     return *this;
   }
 
+  /// True when nothing is held.
   bool IsEmpty() const noexcept { return m_ops == nullptr; }
+  /// Destroys the held value; the Any is empty afterwards.
   void Reset() noexcept {
     if (m_ops) {
       m_ops->destroy(m_storage);
@@ -167,10 +182,10 @@ public:
     }
   }
 
-  // The held kind; typeid(void) for the empty value.
+  /// The held kind; typeid(void) for the empty value.
   const std::type_info& Type() const noexcept { return m_ops ? *m_ops->type : typeid(void); }
 
-  // True when the held kind is T; a `const U*` also accepts a held `U*`.
+  /// True when the held kind is T; a `const U*` also accepts a held `U*`.
   template <class T> bool IsTypeCompatible() const noexcept {
     if (!m_ops)
       return false;
@@ -183,7 +198,9 @@ public:
     return false;
   }
 
-  // The held value; throws std::bad_cast unless the held kind is exactly T.
+  ///@{
+
+  /// The held value; throws std::bad_cast unless the held kind is exactly T.
   template <class T> T& Get() {
     if (T* held = GetIf<T>())
       return *held;
@@ -194,7 +211,11 @@ public:
       return *held;
     throw std::bad_cast();
   }
-  // The held value, or null when the held kind is not exactly T.
+  ///@}
+
+  ///@{
+
+  /// The held value, or null when the held kind is not exactly T.
   template <class T> T* GetIf() noexcept {
     if (!m_ops || !detail::SameKind(*m_ops->type, typeid(T)))
       return nullptr;
@@ -206,12 +227,17 @@ public:
       return *static_cast<T**>(storage);
   }
   template <class T> const T* GetIf() const noexcept { return const_cast<Any*>(this)->GetIf<T>(); }
+  ///@}
 
+  /// True when the held kind is an enumeration.
   bool HasEnum() const noexcept { return m_ops && m_ops->isEnum; }
+  /// The held enumeration's value as an integer; 0 when no enumeration is held.
   long long GetEnumAsInt() const { return HasEnum() ? m_ops->enumAsInt(Object()) : 0; }
 
-  // Different kinds are unequal; two empty values are equal; a kind without
-  // an equality of its own never compares equal.
+  ///@{
+
+  /// Different kinds are unequal; two empty values are equal; a kind without
+  /// an equality of its own never compares equal.
   friend bool operator==(const Any& a, const Any& b) {
     if (!a.m_ops || !b.m_ops)
       return !a.m_ops && !b.m_ops;
@@ -220,10 +246,11 @@ public:
     return a.m_ops->equal && a.m_ops->equal(a.Object(), b.Object());
   }
   friend bool operator!=(const Any& a, const Any& b) { return !(a == b); }
+  ///@}
 
-  // Values of different kinds are ordered by kind (a fixed ranking by type
-  // name, the empty kind first); same kinds by their own `<`, never less for
-  // kinds without one.
+  /// Values of different kinds are ordered by kind (a fixed ranking by type
+  /// name, the empty kind first); same kinds by their own `<`, never less for
+  /// kinds without one.
   friend bool operator<(const Any& a, const Any& b) {
     if (!a.m_ops || !b.m_ops)
       return !a.m_ops && b.m_ops;

@@ -1,6 +1,7 @@
-// The style object and the keys that name its properties. A PropertyKey is
-// an interned UTF-16 name, one word wide, compared by identity; the process
-// pool that holds the names is Styles::StringPool::Get().
+/// @file
+/// The style object and the keys that name its properties. A PropertyKey is
+/// an interned UTF-16 name, one word wide, compared by identity; the process
+/// pool that holds the names is Styles::StringPool::Get().
 #pragma once
 
 #include <Styles/Export.h>
@@ -28,14 +29,14 @@ class Writer;
 
 namespace Styles {
 
-// Tag of the process-wide pool of property and category names.
+/// Tag of the process-wide pool of property and category names.
 struct STYLES_API StringPool {
-  // The pool, created on first use (thread-safe) and destroyed at exit.
+  /// The pool, created on first use (thread-safe) and destroyed at exit.
   static ZelUtils::StringPool& Get();
 };
 
-// An interned name. Equality, ordering and hashing go by pool entry, so maps
-// of keys iterate in identity order, not alphabetically.
+/// An interned name. Equality, ordering and hashing go by pool entry, so maps
+/// of keys iterate in identity order, not alphabetically.
 using PropertyKey = ZelUtils::PooledString<StringPool>;
 
 class Style;
@@ -43,34 +44,55 @@ class StyleCategory;
 class StyleSheet;
 class BaseStyleProperty;
 
-// The JSON value written and read by styles and behaviours.
+/// The JSON value written and read by styles and behaviours.
 using JsonValue = Json::Value;
-// A read-only set of styles that knows whether it is sorted by address.
+/// A read-only set of styles that knows whether it is sorted by address.
 using StyleSpan = ZelUtils::maybe_sorted_span<Style* const, std::less<void>>;
-// Visitor of property values: (value, holding style, key); false stops.
+/// Visitor of property values: (value, holding style, key); false stops.
 using PropertyVisitor =
     ZelUtils::PortableVersion::Delegate<bool(ZelUtils::Any&, Style*, const PropertyKey&)>;
-// Visitor of styles; false stops.
+/// Visitor of styles; false stops.
 using StyleVisitor = ZelUtils::PortableVersion::Delegate<bool(Style*)>;
 
-// The own values of a style: a flat array sorted by key identity, searched
-// linearly while small and by bisection when large. Iteration is in key order.
+/// The own values of a style: a flat array sorted by key identity, searched
+/// linearly while small and by bisection when large. Iteration is in key order.
 class STYLES_API PropertyMap {
 public:
+  /// A key and its value.
   using Entry = std::pair<PropertyKey, ZelUtils::Any>;
+  ///@{
+
+  /// Iterator over the entries, in key order.
   using const_iterator = std::vector<Entry>::const_iterator;
   using iterator = std::vector<Entry>::iterator;
+  ///@}
 
+  ///@{
+
+  /// The entries in key order.
   const_iterator begin() const noexcept { return m_entries.begin(); }
   const_iterator end() const noexcept { return m_entries.end(); }
   iterator begin() noexcept { return m_entries.begin(); }
   iterator end() noexcept { return m_entries.end(); }
+  ///@}
+
+  ///@{
+
+  /// The number of entries.
   std::size_t size() const noexcept { return m_entries.size(); }
   bool empty() const noexcept { return m_entries.empty(); }
+  ///@}
+
+  ///@{
+
+  /// Entry i in key order; i must be below size().
   const Entry& operator[](std::size_t i) const noexcept { return m_entries[i]; }
   Entry& operator[](std::size_t i) noexcept { return m_entries[i]; }
+  ///@}
 
-  // The value stored under `key`, or null.
+  ///@{
+
+  /// The value stored under `key`, or null.
   const ZelUtils::Any* Find(const PropertyKey& key) const noexcept {
     if (m_entries.empty() || m_entries.back().first < key)
       return nullptr; // beyond the last key, as a value being appended is
@@ -80,13 +102,20 @@ public:
   ZelUtils::Any* Find(const PropertyKey& key) noexcept {
     return const_cast<ZelUtils::Any*>(static_cast<const PropertyMap*>(this)->Find(key));
   }
+  ///@}
+
+  /// Whether `key` has an entry.
   bool Contains(const PropertyKey& key) const noexcept { return Find(key) != nullptr; }
-  // Stores `value` under `key` unless the key is present; true when stored.
+  /// Stores `value` under `key` unless the key is present; true when stored.
   bool Insert(const PropertyKey& key, ZelUtils::Any&& value);
-  // Removes the entry of `key`; true when there was one.
+  /// Removes the entry of `key`; true when there was one.
   bool Erase(const PropertyKey& key);
+  /// Removes every entry. Like Erase, it releases nothing a value owns: a
+  /// style releases its substyles through their behaviours first.
   void Clear() noexcept { m_entries.clear(); }
+  /// Makes room for `count` entries in all: a hint, never needed.
   void Reserve(std::size_t count) { m_entries.reserve(count); }
+  /// Exchanges the entries of the two maps without copying a value.
   void Swap(PropertyMap& other) noexcept { m_entries.swap(other.m_entries); }
 
 private:
@@ -116,214 +145,279 @@ private:
   std::vector<Entry> m_entries;
 };
 
-// A set of property values of one category, with a parent to inherit from
-// and, for a substyle, the style (owner) whose property holds it. Every
-// value-specific decision goes through the behaviour that the category
-// registers for the key. The style owns its values and the substyles in them;
-// parent and owner are never owned.
+/// A set of property values of one category, with a parent to inherit from
+/// and, for a substyle, the style (owner) whose property holds it. Every
+/// value-specific decision goes through the behaviour that the category
+/// registers for the key. The style owns its values and the substyles in them;
+/// parent and owner are never owned.
 class STYLES_API Style {
 public:
+  /// A free style without category, parent or values; see SetCategory.
   Style();
-  // A free style of the category registered under `categoryName` (none when
-  // unknown) inheriting from `parent` (not owned).
+  /// A free style of the category registered under `categoryName` (none when
+  /// unknown) inheriting from `parent` (not owned).
   Style(Style* parent, const PropertyKey& categoryName);
-  // A copy has the source's parent, category, strings and copied values but
-  // no owner.
+  /// A copy has the source's parent, category, strings and copied values but
+  /// no owner.
   Style(const Style& other);
+  /// Takes the source's values as move assignment does.
   Style(Style&& other);
+  /// Destroys the own values, then takes the source's parent, category and
+  /// strings and copies of its values; the owner stays.
   Style& operator=(const Style& other);
-  // Takes the source's values; the source keeps its parent, category and
-  // strings but no values.
+  /// Takes the source's values; the source keeps its parent, category and
+  /// strings but no values.
   Style& operator=(Style&& other);
-  // Destroys the own values (and so the owned substyles).
+  /// Destroys the own values (and so the owned substyles).
   ~Style();
 
+  /// Makes the style inherit from `parent` (not owned; may be null). Not
+  /// checked for cycles: sheets refuse them when they read documents.
   void SetParent(Style* parent) noexcept { m_parent = parent; }
+  /// The style this one inherits from, or null; not owned.
   Style* GetParent() const noexcept { return m_parent; }
+  ///@{
+
+  /// The style whose property holds this substyle, and that property's key;
+  /// null and empty for a top-level style. Not owned.
   Style* GetOwner() const noexcept { return m_owner; }
   const PropertyKey& GetOwnerPropertyKey() const noexcept { return m_ownerPropertyKey; }
-  // Used by substyle behaviours to point a held substyle back at its holder.
+  ///@}
+
+  /// Used by substyle behaviours to point a held substyle back at its holder.
   void SetOwner(Style* owner, const PropertyKey& ownerPropertyKey) noexcept {
     m_owner = owner;
     m_ownerPropertyKey = ownerPropertyKey;
   }
-  // Binds the style to the registered category `name`; on any failure the
-  // previous category stays. Never throws.
+  /// Binds the style to the registered category `name`; on any failure the
+  /// previous category stays. Never throws.
   void SetCategory(const PropertyKey& name);
+  ///@{
+
+  /// The category's key and object; empty and null without category. The
+  /// category object is shared with the manager.
   PropertyKey GetCategoryName() const noexcept;
   const std::shared_ptr<const StyleCategory>& GetCategory() const noexcept { return m_category; }
-  // Also sets the same field of the single substyles held directly by a
-  // style of the "style" category (one level deep).
+  ///@}
+
+  ///@{
+
+  /// Sets the ID (or name) of the external style this one stands for.
+  /// Also sets the same field of the single substyles held directly by a
+  /// style of the "style" category (one level deep).
   void SetExternalID(const ZelStringT<char16_t>& id);
   void SetExternalName(const ZelStringT<char16_t>& name);
+  ///@}
+
+  ///@{
+
+  /// The ID and name of the external style; empty when not set.
   const ZelStringT<char16_t>& GetExternalID() const noexcept { return m_externalID; }
   const ZelStringT<char16_t>& GetExternalName() const noexcept { return m_externalName; }
+  ///@}
+
+  /// True when the style has an external ID.
   bool IsExternal() const noexcept { return !m_externalID.IsEmpty(); }
-  // The own values in key order.
+  /// The own values in key order.
   const PropertyMap& GetProperties() const noexcept { return m_properties; }
 
-  // Points the substyles of every own value back at this style.
+  /// Points the substyles of every own value back at this style.
   void RepairSubstyleOwnerPointers();
-  // Exchanges everything but owner and owner key, then repairs both styles.
+  /// Exchanges everything but owner and owner key, then repairs both styles.
   void SwapData(Style& other);
 
-  // Same category object, parent, strings and values; owners are ignored and
-  // a key without behaviour makes the styles unequal.
+  ///@{
+
+  /// Same category object, parent, strings and values; owners are ignored and
+  /// a key without behaviour makes the styles unequal.
   bool operator==(const Style& other) const;
   bool operator!=(const Style& other) const { return !(*this == other); }
-  // A strict order for sorting; a key without behaviour counts as equal.
+  ///@}
+
+  /// A strict order for sorting; a key without behaviour counts as equal.
   bool operator<(const Style& other) const;
-  // Like operator<, but equal parentless substyles are ordered by the
-  // substyle their owners would inherit from.
+  /// Like operator<, but equal parentless substyles are ordered by the
+  /// substyle their owners would inherit from.
   bool substyle_less_including_owner_based_inheritance(const Style& other) const;
 
-  // Lookup. References point into styles or categories and are never copies.
-  // The own value, else the inherited one, else the category default. Throws
-  // std::exception for a key nobody holds that the category does not register.
-  const ZelUtils::Any& GetProperty(const PropertyKey& key) const;
-  // The value the style would have without its own value.
-  const ZelUtils::Any& GetInheritedProperty(const PropertyKey& key) const;
-  // False for an unregistered key or when only the default is found; else
-  // copies the value into `out`.
-  bool GetProperty(const PropertyKey& key, ZelUtils::Any& out) const;
-  // False when only the default is found; else copies into `out`.
-  bool GetInheritedProperty(const PropertyKey& key, ZelUtils::Any& out) const;
-  // Copies the own value into `out`; false when there is none.
-  bool GetOverrideProperty(const PropertyKey& key, ZelUtils::Any& out) const;
-  bool DoesOverrideProperty(const PropertyKey& key) const noexcept;
-  // The single substyle under `key`. With `inherited` the effective value
-  // counts and must hold a Style* (else std::bad_cast); without, only an own
-  // Style* value counts (else null). Owned by the holding style.
-  Style* GetSubstyle(const PropertyKey& key, bool inherited) const;
-  // The own substyle under `key`, created from an empty style of
-  // `categoryName` when missing; null when nothing can be stored.
-  Style* GetSubstyleAndCreateIfMissing(const PropertyKey& key, const PropertyKey& categoryName);
-  // The effective value at the end of `path`; where the path leaves the own
-  // substyles, the default of the category reached through element
-  // categories. Throws std::exception for an empty path or a lost category.
-  const ZelUtils::Any& GetPathProperty(const std::vector<PropertyKey>& path) const;
+  /// @name Lookup
+  /// References point into styles or categories and are never copies.
+  ///@{
 
-  // Editing. A key without behaviour in the category is never stored.
-  // Copying form: destroys the old value, then stores what the behaviour
-  // makes of a copy of `value` (an empty result clears the key).
+  /// The own value, else the inherited one, else the category default. Throws
+  /// std::exception for a key nobody holds that the category does not register.
+  const ZelUtils::Any& GetProperty(const PropertyKey& key) const;
+  /// The value the style would have without its own value.
+  const ZelUtils::Any& GetInheritedProperty(const PropertyKey& key) const;
+  /// False for an unregistered key or when only the default is found; else
+  /// copies the value into `out`.
+  bool GetProperty(const PropertyKey& key, ZelUtils::Any& out) const;
+  /// False when only the default is found; else copies into `out`.
+  bool GetInheritedProperty(const PropertyKey& key, ZelUtils::Any& out) const;
+  /// Copies the own value into `out`; false when there is none.
+  bool GetOverrideProperty(const PropertyKey& key, ZelUtils::Any& out) const;
+  /// Whether the style sets `key` itself.
+  bool DoesOverrideProperty(const PropertyKey& key) const noexcept;
+  /// The single substyle under `key`. With `inherited` the effective value
+  /// counts and must hold a Style* (else std::bad_cast); without, only an own
+  /// Style* value counts (else null). Owned by the holding style.
+  Style* GetSubstyle(const PropertyKey& key, bool inherited) const;
+  /// The own substyle under `key`, created from an empty style of
+  /// `categoryName` when missing; null when nothing can be stored.
+  Style* GetSubstyleAndCreateIfMissing(const PropertyKey& key, const PropertyKey& categoryName);
+  /// The effective value at the end of `path`; where the path leaves the own
+  /// substyles, the default of the category reached through element
+  /// categories. Throws std::exception for an empty path or a lost category.
+  const ZelUtils::Any& GetPathProperty(const std::vector<PropertyKey>& path) const;
+  ///@}
+
+  /// @name Editing
+  /// A key without behaviour in the category is never stored.
+  ///@{
+
+  /// Copying form: destroys the old value, then stores what the behaviour
+  /// makes of a copy of `value` (an empty result clears the key).
   void SetProperty(const PropertyKey& key, const ZelUtils::Any& value);
-  // Moving form: does nothing without category or behaviour; an empty result
-  // removes the entry without destroying the old value.
+  /// Moving form: does nothing without category or behaviour; an empty result
+  /// removes the entry without destroying the old value.
   void SetProperty(const PropertyKey& key, ZelUtils::Any&& value);
-  // Wraps `value` in an Any and calls the moving form.
+  /// Wraps `value` in an Any and calls the moving form.
   template <class T, class = std::enable_if_t<!std::is_same<std::decay_t<T>, ZelUtils::Any>::value>>
   void SetProperty(const PropertyKey& key, T value) {
     SetProperty(key, ZelUtils::Any(std::move(value)));
   }
-  // Releases what `value` owns through the behaviour of `key`, if any.
+  /// Releases what `value` owns through the behaviour of `key`, if any.
   void DestroyPropertyData(const PropertyKey& key, const ZelUtils::Any& value) const;
-  // Removes the own value of `key`; false when there was none.
+  /// Removes the own value of `key`; false when there was none.
   bool ClearProperty(const PropertyKey& key);
-  // ClearProperty at the end of `path` through own substyles.
+  /// ClearProperty at the end of `path` through own substyles.
   bool ClearPathProperty(const std::vector<PropertyKey>& path);
-  // Clears only where clearing lets a value be inherited (or when `force`).
+  /// Clears only where clearing lets a value be inherited (or when `force`).
   bool RevertPathProperty(const std::vector<PropertyKey>& path, bool force);
-  // Clears every key that `keysOf` holds itself; nothing for null.
+  /// Clears every key that `keysOf` holds itself; nothing for null.
   void ClearProperties(const Style* keysOf);
-  // Destroys and removes every own value; links, category and strings stay.
+  /// Destroys and removes every own value; links, category and strings stay.
   void ClearAllProperties();
-  // A new free style of the same category holding the effective values of
-  // `keys` (defaults included) as its own. The caller owns it.
+  /// A new free style of the same category holding the effective values of
+  /// `keys` (defaults included) as its own. The caller owns it.
   Style* CopyProperties(const std::set<PropertyKey>& keys) const;
-  // Sets the last key of `path`, creating own substyles along the way.
+  /// Sets the last key of `path`, creating own substyles along the way.
   void SetPathProperty(const std::vector<PropertyKey>& path, const ZelUtils::Any& value);
+  /// The same, moving `value`.
   void SetPathProperty(const std::vector<PropertyKey>& path, ZelUtils::Any&& value);
-  // Copies the own value at `path` of `source` (not null), clearing where
-  // the source holds none.
+  /// Copies the own value at `path` of `source` (not null), clearing where
+  /// the source holds none.
   void SetPathProperty(const std::vector<PropertyKey>& path, const Style* source);
+  /// The same for every path of `paths`, in order.
   void SetProperties(const std::vector<std::vector<PropertyKey>>& paths, const Style* source);
+  ///@}
 
-  // Resetting and structural queries.
-  // Removes every own value but the single substyles, which are emptied the
-  // same way; true when anything was removed at any depth. Links, category
-  // and strings stay.
+  /// @name Resetting and structural queries
+  ///@{
+
+  /// Removes every own value but the single substyles, which are emptied the
+  /// same way; true when anything was removed at any depth. Links, category
+  /// and strings stay.
   bool RevertAllProperties();
-  // Destroys every own value, substyles included, and cuts the parent link;
-  // owner, category and strings stay.
+  /// Destroys every own value, substyles included, and cuts the parent link;
+  /// owner, category and strings stay.
   void Clear();
-  // Whether a substyle at any depth has a parent.
+  /// Whether a substyle at any depth has a parent.
   bool SubstylesHaveAnyParentalRelationships() const;
-  // Whether the style holds nothing but substyles that are empty the same way.
+  /// Whether the style holds nothing but substyles that are empty the same way.
   bool IsEmptyWithEmptySubstyles() const;
-  // Whether the style reached along `path` through own substyles sets the
-  // last key itself. A last key "*" asks whether it sets or inherits anything
-  // at all (a parent, a value, a substyle with a parent).
+  /// Whether the style reached along `path` through own substyles sets the
+  /// last key itself. A last key "*" asks whether it sets or inherits anything
+  /// at all (a parent, a value, a substyle with a parent).
   bool DoesOverridePathProperty(const std::vector<PropertyKey>& path) const;
-  // The UI name of the style's category; empty without category.
+  /// The UI name of the style's category; empty without category.
   ZelStringT<char16_t> GetCategoryUIName() const;
-  // The number of own single-substyle values; arrays do not count.
+  /// The number of own single-substyle values; arrays do not count.
   unsigned GetNumSubstyles() const;
-  // The own substyle of the last single-substyle entry in key order, looked
-  // up under that behaviour's element category name; null when none.
+  /// The own substyle of the last single-substyle entry in key order, looked
+  /// up under that behaviour's element category name; null when none.
   Style* GetLastSubstyle() const;
+  ///@}
 
-  // Merging and flattening.
-  // Merges every own value of `other` through the behaviours of `other`'s
-  // category; with `overwrite` false values this style sets itself stay.
+  /// @name Merging and flattening
+  ///@{
+
+  /// Merges every own value of `other` through the behaviours of `other`'s
+  /// category; with `overwrite` false values this style sets itself stay.
   void MergeProperties(const Style* other, bool overwrite);
-  // Takes over the values `parent` sets itself where this style sets none.
+  /// Takes over the values `parent` sets itself where this style sets none.
   void MergeParentProperties(const Style* parent);
-  // Makes every effective value of the category's keys the style's own and
-  // cuts the parent link. Keys flattened are added to `flattenedKeys`; the
-  // result is whether that set is non-empty (it is not cleared on entry).
+  /// Makes every effective value of the category's keys the style's own and
+  /// cuts the parent link. Keys flattened are added to `flattenedKeys`; the
+  /// result is whether that set is non-empty (it is not cleared on entry).
   bool Flatten(std::set<PropertyKey>& flattenedKeys);
+  /// The same without reporting the keys; true when any key was flattened.
   bool Flatten();
-  // A flattened free copy, resolved as this style resolves in its owner.
-  // The caller owns it.
+  /// A flattened free copy, resolved as this style resolves in its owner.
+  /// The caller owns it.
   Style* CreateFlattenedStyle(std::set<PropertyKey>& flattenedKeys) const;
+  /// The same without reporting the keys. The caller owns the result.
   Style* CreateFlattenedStyle() const;
-  // True when some values can only be resolved through the owners.
+  /// True when some values can only be resolved through the owners.
   bool StylePropertiesHasDependencyOnOwner() const;
-  // Makes this style's substyle under `key` resolve as `source`'s does.
+  /// Makes this style's substyle under `key` resolve as `source`'s does.
   void CopySubstyleProperties(const Style* source, const PropertyKey& key);
-  // Free copies that resolve on their own as the originals do inside their
-  // owners. The caller owns the result.
+  /// A free copy of the substyle under `key` that resolves on its own as the
+  /// original does inside its owners. The caller owns the result.
   Style* CreateSubStyleCloneWithNoDependencyOnOwner(const PropertyKey& key) const;
+  /// The same for the style itself. The caller owns the result.
   Style* CreateStyleCloneWithNoDependencyOnOwner() const;
+  ///@}
 
-  // Dependencies on other styles: itself, its parents and what values hold.
-  // Every walk along the parent chain is a loop: any length of chain is
-  // answered in linear time and constant stack.
+  /// @name Dependencies on other styles
+  /// A style depends on itself, its parents and what its values hold.
+  /// Every walk along the parent chain is a loop: any length of chain is
+  /// answered in linear time and constant stack.
+  ///@{
+
+  /// Whether the style is one of `styles`, inherits from one, or holds a value
+  /// that depends on one; with `parentOnly`, only the style itself, its parent
+  /// and the parents of its substyles count.
   bool HasDependency(StyleSpan styles, bool parentOnly) const;
-  // The styles of `styles` this style depends on, sorted, without repeats.
+  /// The styles of `styles` this style depends on, sorted, without repeats.
   std::vector<Style*> GetDependencies(StyleSpan styles, bool parentOnly) const;
-  // The same for a span that is sorted.
+  /// The same for a span that is sorted.
   std::vector<Style*> GetDependenciesImpl(StyleSpan styles, bool parentOnly) const;
-  // Whether an ancestor is in `styles` or depends on one of them.
+  /// Whether an ancestor is in `styles` or depends on one of them.
   bool HasParentalDependency(StyleSpan styles) const;
-  // Whether the style inherits from any other style.
+  /// Whether the style inherits from any other style.
   bool HasParentalDependency() const;
-  // Cuts the dependencies on `styles`, keeping every effective value.
+  /// Cuts the dependencies on `styles`, keeping every effective value.
   void RemoveDependency(StyleSpan styles, bool parentOnly);
-  // Folds the whole parent chain into the style and cuts every dependency.
+  /// Folds the whole parent chain into the style and cuts every dependency.
   void RemoveAllDependencies();
-  // Redirects the parent and the values from old styles to new ones; a
-  // mapping to null is ignored.
+  /// Redirects the parent and the values from old styles to new ones; a
+  /// mapping to null is ignored.
   void RemapDependency(const std::map<Style*, Style*>& map);
-  // Redirects pointer-like values held in the values; the parent stays.
+  /// Redirects pointer-like values held in the values; the parent stays.
   void RemapPointer(const std::vector<std::pair<ZelUtils::Any, ZelUtils::Any>>& pairs);
-  // Visits every own value in key order; false when the visitor stopped.
+  /// Visits every own value in key order; false when the visitor stopped.
   bool ProcessProperties(const PropertyVisitor& visit);
-  // Visits the own values at `paths`; false when the visitor stopped.
+  /// Visits the own values at `paths`; false when the visitor stopped.
   bool ProcessProperties(const std::vector<std::vector<PropertyKey>>& paths,
                          const PropertyVisitor& visit);
+  ///@}
 
-  // JSON form. Fills `out` with the style's object: "inherits" (the parent's
-  // name in `sheet`), "id", "original", then the own values in key order.
+  /// @name JSON form
+  ///@{
+
+  /// Fills `out` with the style's object: "inherits" (the parent's
+  /// name in `sheet`), "id", "original", then the own values in key order.
   void Serialize(const StyleSheet& sheet, JsonValue& out, bool includeTemporary) const;
-  // The same as text.
+  /// The same as text.
   ZelStringT<char16_t> Serialize(const StyleSheet& sheet, bool format, bool includeTemporary) const;
-  // Reads `object` into this style (which has its category); parent names
-  // resolve in `sheet`. Exceptions of behaviours pass through.
+  /// Reads `object` into this style (which has its category); parent names
+  /// resolve in `sheet`. Exceptions of behaviours pass through.
   void DeserializeJson(const StyleSheet& sheet, const Json::Object& object);
-  // A new parentless style of `category` read from `object`; the caller owns it.
+  /// A new parentless style of `category` read from `object`; the caller owns it.
   static Style* Deserialize(const StyleSheet& sheet, const Json::Object& object,
                             const PropertyKey& category);
+  ///@}
 
 private:
   // Adopts deserialized substyles into the property map without copying.
@@ -379,7 +473,7 @@ private:
 } // namespace Styles
 
 namespace ZelUtils {
-// The key of the empty text.
+/// The key of the empty text.
 template <>
 STYLES_API const PooledString<Styles::StringPool> PooledString<Styles::StringPool>::Empty;
 } // namespace ZelUtils

@@ -66,8 +66,9 @@ std::size_t HashName(std::u16string_view name) {
 
 } // namespace
 
-void StyleCategory::PlaceByName(std::vector<std::pair<std::u16string_view, BaseStyleProperty*>>& table,
-                                std::u16string_view name, BaseStyleProperty* property) {
+void StyleCategory::PlaceByName(
+    std::vector<std::pair<std::u16string_view, BaseStyleProperty*>>& table,
+    std::u16string_view name, BaseStyleProperty* property) {
   const std::size_t mask = table.size() - 1;
   std::size_t i = HashName(name) & mask;
   while (table[i].second)

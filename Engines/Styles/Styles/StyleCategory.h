@@ -1,6 +1,7 @@
-// A style category: one named set of property behaviours. Every style belongs
-// to one category, which says which properties exist for it and which
-// behaviour governs each. Categories are created and owned by the manager.
+/// @file
+/// A style category: one named set of property behaviours. Every style belongs
+/// to one category, which says which properties exist for it and which
+/// behaviour governs each. Categories are created and owned by the manager.
 #pragma once
 
 #include <Styles/Export.h>
@@ -22,37 +23,41 @@ namespace Styles {
 
 class BaseStyleProperty;
 
+/// A category and the behaviours of its properties, which it owns.
 class STYLES_API StyleCategory {
 public:
-  // `flag` is kept for the host; the library never reads it.
+  /// `flag` is kept for the host; the library never reads it.
   StyleCategory(const PropertyKey& key, const ZelStringT<char16_t>& uiName, bool flag);
   StyleCategory(const StyleCategory&) = delete;
   StyleCategory& operator=(const StyleCategory&) = delete;
-  // Frees only the containers: behaviours are deleted by PreDestroyProperties.
+  /// Frees only the containers: behaviours are deleted by PreDestroyProperties.
   virtual ~StyleCategory();
 
-  // Takes ownership of `property` under `key`. The first registration wins: a
-  // second one for the same key is ignored and the caller keeps its object.
+  /// Takes ownership of `property` under `key`. The first registration wins: a
+  /// second one for the same key is ignored and the caller keeps its object.
   void RegisterProperty(const PropertyKey& key, BaseStyleProperty* property);
-  // The behaviour registered under `key`, or null. Not owned by the caller.
+  /// The behaviour registered under `key`, or null. Not owned by the caller.
   BaseStyleProperty* GetStyleProperty(const PropertyKey& key) const;
-  // The behaviour registered under the key whose text is `name`, or null:
-  // names read from documents are looked up without being pooled.
+  /// The behaviour registered under the key whose text is `name`, or null:
+  /// names read from documents are looked up without being pooled.
   BaseStyleProperty* FindStyleProperty(std::u16string_view name) const;
-  // The behaviour's default value, one stable object per key. Throws
-  // std::exception when no behaviour is registered under `key`.
+  /// The behaviour's default value, one stable object per key. Throws
+  /// std::exception when no behaviour is registered under `key`.
   const ZelUtils::Any& GetDefaultValue(const PropertyKey& key) const;
-  // The behaviour's conversion policy; null for an unknown key.
+  /// The behaviour's conversion policy; null for an unknown key.
   ZelPref::ConversionPolicy* GetConversionPolicy(const PropertyKey& key) const;
-  // Deletes every behaviour and empties the map; the registration order stays.
+  /// Deletes every behaviour and empties the map; the registration order stays.
   void PreDestroyProperties();
 
+  /// The key the category is registered under.
   const PropertyKey& GetKey() const noexcept { return m_key; }
+  /// The name shown to users, as first registered.
   const ZelStringT<char16_t>& GetUIName() const noexcept { return m_uiName; }
+  /// The host's flag, as first registered.
   bool GetFlag() const noexcept { return m_flag; }
-  // Property keys in registration order.
+  /// Property keys in registration order.
   const std::vector<PropertyKey>& GetPropertyOrder() const noexcept { return m_propertyOrder; }
-  // The behaviours in key (identity) order.
+  /// The behaviours in key (identity) order.
   const std::map<PropertyKey, BaseStyleProperty*>& GetProperties() const noexcept {
     return m_properties;
   }

@@ -2,6 +2,7 @@
 
 #include <Styles/StyleCategory.h>
 #include <Styles/StyleManager.h>
+#include <Styles/StyleProperty.h>
 
 #include <Styles/Internal/JsonAccess.h>
 
@@ -18,7 +19,6 @@
 #include <memory>
 #include <optional>
 #include <typeinfo>
-#include <unordered_map>
 #include <utility>
 
 namespace Styles {
@@ -90,10 +90,42 @@ private:
     std::uint32_t child[2] = {kNone, kNone};
     std::uint32_t up = kNone; // parent in the splay tree, else the path's parent
   };
+  struct Slot {
+    const Style* style = nullptr;
+    std::uint32_t node = kNone;
+  };
 
   std::uint32_t Find(const Style* style) const {
-    const auto found = m_index.find(style);
-    return found == m_index.end() ? kNone : found->second;
+    if (m_slots.empty())
+      return kNone;
+    for (std::size_t i = Hash(style);; i = (i + 1) & (m_slots.size() - 1)) {
+      if (!m_slots[i].style)
+        return kNone;
+      if (m_slots[i].style == style)
+        return m_slots[i].node;
+    }
+  }
+  // Files `node` as the node of `style`, which has none yet.
+  void Index(const Style* style, std::uint32_t node) {
+    if ((m_nodes.size() + 1) * 2 > m_slots.size()) {
+      std::vector<Slot> slots(std::max<std::size_t>(64, m_slots.size() * 2));
+      slots.swap(m_slots);
+      for (const Slot& slot : slots)
+        if (slot.style)
+          Place(slot);
+    }
+    Place(Slot{style, node});
+  }
+  void Place(const Slot& slot) {
+    std::size_t i = Hash(slot.style);
+    while (m_slots[i].style)
+      i = (i + 1) & (m_slots.size() - 1);
+    m_slots[i] = slot;
+  }
+  std::size_t Hash(const Style* style) const {
+    return static_cast<std::size_t>((reinterpret_cast<std::uintptr_t>(style) >> 4) *
+                                    0x9E3779B97F4A7C15ull) &
+           (m_slots.size() - 1);
   }
   // The node of `style`, made with those of its ancestors when missing.
   std::uint32_t Load(const Style* style) {
@@ -108,8 +140,8 @@ private:
     }
     for (auto it = m_chain.rbegin(); it != m_chain.rend(); ++it) {
       const auto node = static_cast<std::uint32_t>(m_nodes.size());
+      Index(*it, node);
       m_nodes.emplace_back();
-      m_index.emplace(*it, node);
       if (above != kNone)
         Attach(node, above);
       above = node;
@@ -178,7 +210,8 @@ private:
   }
 
   std::vector<Node> m_nodes;
-  std::unordered_map<const Style*, std::uint32_t> m_index;
+  // Each style's node, by open addressing on the style's address.
+  std::vector<Slot> m_slots;
   std::vector<const Style*> m_chain; // scratch of Load
 };
 
@@ -848,16 +881,6 @@ bool StyleSheet::ImportJson(Json::Object* document, bool replace) {
   return true;
 }
 
-namespace {
-
-// Whether a category is registered under `name`, without pooling the name.
-bool IsCategory(const StyleManager& manager, std::u16string_view name) {
-  const std::optional<PropertyKey> key = PropertyKey::Find(name);
-  return key && manager.FindCategory(*key);
-}
-
-} // namespace
-
 template <class Access>
 void StyleSheet::ImportMembers(const typename Access::Object& document, bool replace) {
   StyleManager& manager = GetStyleManager();
@@ -883,6 +906,7 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
     replaced.clear();
   };
   bool versionSeen = false;
+  bool anyReplaced = false;
 
   // The members are gone through twice. The first pass makes an empty style
   // for every name, so that every reference resolves when the second pass
@@ -901,12 +925,9 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
     }
   };
 
-  try {
-    std::size_t styleCount = m_index->Size();
-    for (std::size_t i = 0; i < memberCount; ++i)
-      if (const auto category = Access::AsObject(Access::Member(document, i)))
-        styleCount += Access::Size(*category);
-    m_index->Reserve(styleCount);
+  // Goes through the members in document order: the sheet's own members
+  // are applied, and `styles` gets each registered category's object.
+  const auto forEachMember = [&](auto&& styles) {
     for (std::size_t i = 0; i < memberCount; ++i) {
       const std::u16string_view name = Access::Name(document, i);
       const typename Access::Value value = Access::Member(document, i);
@@ -915,10 +936,21 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
         applySheetMember(name, value);
         continue;
       }
-      if (!IsCategory(manager, name))
-        continue;
-      for (std::size_t j = 0; j < Access::Size(*category); ++j) {
-        Access::RequireObject(Access::Member(*category, j)); // std::bad_cast for a non-object
+      const std::optional<PropertyKey> categoryKey = PropertyKey::Find(name);
+      if (categoryKey && manager.FindCategory(*categoryKey))
+        styles(*categoryKey, *category);
+    }
+  };
+
+  try {
+    std::size_t styleCount = m_index->Size();
+    for (std::size_t i = 0; i < memberCount; ++i)
+      if (const auto category = Access::AsObject(Access::Member(document, i)))
+        styleCount += Access::Size(*category);
+    m_index->Reserve(styleCount);
+    forEachMember([&](const PropertyKey&, const typename Access::Object& category) {
+      for (std::size_t j = 0; j < Access::Size(category); ++j) {
+        Access::RequireObject(Access::Member(category, j)); // std::bad_cast for a non-object
         // Room first, so that nothing below can throw once a style is out.
         MakeRoomForOne(filed);
         MakeRoomForOne(replaced);
@@ -926,16 +958,18 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
         Style* previous = nullptr;
         // FileStyle owns `style`, also when it throws.
         const auto [entry, isFiled] =
-            FileStyle(*m_index, Access::Name(*category, j), style, replace, previous);
+            FileStyle(*m_index, Access::Name(category, j), style, replace, previous);
         if (isFiled)
           entry->importStamp = stamp;
         else
           delete style;
-        if (previous)
+        if (previous) {
           replaced.emplace_back(previous, entry);
+          anyReplaced = true;
+        }
         filed.push_back(entry);
       }
-    }
+    });
   } catch (...) {
     repairReplaced();
     throw;
@@ -943,34 +977,126 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
   repairReplaced();
 
   const ImportScope scope(m_import);
-  JsonValue scratch;
-  std::size_t next = 0;
-  for (std::size_t i = 0; i < memberCount; ++i) {
-    const std::u16string_view name = Access::Name(document, i);
-    const typename Access::Value value = Access::Member(document, i);
-    const auto category = Access::AsObject(value);
-    if (!category) {
-      applySheetMember(name, value);
-      continue;
+  // The styles read, and after a replacement every style (a redirected
+  // substyle may now inherit from a style read), are checked for substyles
+  // that inherit their way back to the style holding them: once every link
+  // is known, also when a behaviour throws.
+  const auto dropContainedParents = [&] {
+    std::vector<Style*> roots;
+    if (anyReplaced) {
+      roots = GetStyles();
+    } else {
+      for (const detail::StyleIndex::Entry* entry : filed)
+        if (entry->importStamp == stamp)
+          roots.push_back(entry->style);
     }
-    const std::optional<PropertyKey> categoryKey = PropertyKey::Find(name);
-    if (!categoryKey || !manager.FindCategory(*categoryKey))
-      continue;
-    for (std::size_t j = 0; j < Access::Size(*category); ++j) {
-      const detail::StyleIndex::Entry* entry = filed[next++];
-      if (entry->importStamp != stamp)
-        continue;
-      Style* style = entry->style;
-      style->SetCategory(*categoryKey);
-      style->ReadMembers<Access>(*this, Access::RequireObject(Access::Member(*category, j)),
-                                 scratch);
-      if (!m_externalID.IsEmpty())
-        style->SetExternalID(m_externalID);
-    }
+    DropSubstyleCycles(roots);
+  };
+  try {
+    JsonValue scratch;
+    std::size_t next = 0;
+    forEachMember([&](const PropertyKey& categoryKey, const typename Access::Object& category) {
+      for (std::size_t j = 0; j < Access::Size(category); ++j) {
+        const detail::StyleIndex::Entry* entry = filed[next++];
+        if (entry->importStamp != stamp)
+          continue;
+        Style* style = entry->style;
+        style->SetCategory(categoryKey);
+        style->ReadMembers<Access>(*this, Access::RequireObject(Access::Member(category, j)),
+                                   scratch);
+        if (!m_externalID.IsEmpty())
+          style->SetExternalID(m_externalID);
+      }
+    });
+  } catch (...) {
+    dropContainedParents();
+    throw;
   }
+  dropContainedParents();
 
   if (!versionSeen)
     m_version = 0;
+}
+
+void StyleSheet::DropSubstyleCycles(const std::vector<Style*>& roots) {
+  // A graph of styles: each points to its parent and to the parent of every
+  // substyle in its tree. Tarjan's algorithm, without recursion, finds the
+  // groups of styles that reach one another; parent links alone never close
+  // a circle, so dropping the substyle links inside each group leaves none.
+  struct Node {
+    std::vector<Style*> linked; // substyles in the tree that have a parent
+    std::size_t index = 0;      // order of discovery, from 1
+    std::size_t low = 0;        // lowest index reached; the group's index once done
+    std::size_t next = 0;       // the next link to follow: the parent, then linked
+    bool onStack = false;
+  };
+  std::unordered_map<const Style*, Node> nodes;
+  std::vector<const Style*> stack, path;
+  std::size_t discovered = 0;
+  const auto enter = [&](const Style* style) {
+    Node& node = nodes[style];
+    node.index = node.low = ++discovered;
+    node.onStack = true;
+    stack.push_back(style);
+    path.push_back(style);
+    std::vector<const Style*> pending{style};
+    while (!pending.empty()) {
+      const Style* holder = pending.back();
+      pending.pop_back();
+      for (const PropertyMap::Entry& entry : holder->GetProperties())
+        if (const BaseStyleProperty* behaviour = holder->FindBehaviour(entry.first))
+          behaviour->ProcessStylesInProperty(entry.second, [&](Style* substyle) {
+            if (substyle) {
+              if (substyle->m_parent)
+                node.linked.push_back(substyle);
+              pending.push_back(substyle);
+            }
+            return true;
+          });
+    }
+  };
+  for (const Style* root : roots) {
+    if (!root || nodes.count(root))
+      continue;
+    enter(root);
+    while (!path.empty()) {
+      const Style* style = path.back();
+      Node& node = nodes[style]; // references survive rehashing
+      if (node.next <= node.linked.size()) {
+        const Style* to = node.next == 0 ? style->m_parent : node.linked[node.next - 1]->m_parent;
+        ++node.next;
+        if (!to)
+          continue;
+        const auto found = nodes.find(to);
+        if (found == nodes.end())
+          enter(to);
+        else if (found->second.onStack)
+          node.low = std::min(node.low, found->second.index);
+        continue;
+      }
+      path.pop_back();
+      if (!path.empty()) {
+        Node& above = nodes[path.back()];
+        above.low = std::min(above.low, node.low);
+      }
+      if (node.low == node.index) {
+        const Style* member = nullptr;
+        do {
+          member = stack.back();
+          stack.pop_back();
+          Node& grouped = nodes[member];
+          grouped.onStack = false;
+          grouped.low = node.index;
+        } while (member != style);
+      }
+    }
+  }
+  for (const auto& [style, node] : nodes)
+    for (Style* substyle : node.linked) {
+      const auto found = nodes.find(substyle->m_parent);
+      if (found != nodes.end() && found->second.low == node.low)
+        substyle->m_parent = nullptr;
+    }
 }
 
 bool StyleSheet::ImportFromString(const ZelStringT<char16_t>& text, bool replace) {

@@ -1,4 +1,5 @@
-// The whole public interface of the style library, platform types included.
+/// @file
+/// The whole public interface of the style library, platform types included.
 #pragma once
 
 #include <Json/Json.h>
