@@ -135,7 +135,6 @@ TEST_F(StyleTest, CopyMoveAndSwapKeepOwnersWhereTheyBelong) {
   const Style copy(*style);
   EXPECT_EQ(copy.GetParent(), base);
   EXPECT_EQ(copy, *style);
-  EXPECT_EQ(copy.GetSubstyle(borderKey, false)->GetOwner(), &copy);
   EXPECT_EQ(Style(*substyle).GetOwner(), nullptr);
 
   Style moved(std::move(*style));
@@ -144,7 +143,6 @@ TEST_F(StyleTest, CopyMoveAndSwapKeepOwnersWhereTheyBelong) {
   EXPECT_EQ(style->GetCategoryName(), para.Key());
   EXPECT_EQ(style->GetExternalID(), ZelStringT<char16_t>(u"ext"));
   EXPECT_EQ(moved.GetSubstyle(borderKey, false), substyle);
-  EXPECT_EQ(substyle->GetOwner(), &moved);
 
   Style other(nullptr, border.Key());
   other.SetPathProperty({cornerKey, radius}, Any(4.0));
