@@ -1,6 +1,6 @@
 // Behaviours a host would write, for tests: a plain number property that
-// counts the values it stores and destroys, a scoped category, and a check of
-// the owner links of a tree of substyles.
+// counts the values it stores and destroys, one that logs its destruction, a
+// scoped category, and a check of the owner links of a tree of substyles.
 #pragma once
 
 #include <Styles/Style.h>
@@ -14,8 +14,10 @@
 
 #include <gtest/gtest.h>
 
+#include <exception>
 #include <memory>
 #include <string>
+#include <typeinfo>
 #include <utility>
 #include <vector>
 
@@ -50,6 +52,25 @@ private:
   ValueCounts* m_counts;
 };
 
+using Log = std::vector<std::string>;
+
+// A behaviour that records its destruction in a shared log.
+struct LoggingProperty final : StyleProperty {
+  LoggingProperty(Log* log, std::string tag)
+      : StyleProperty(ZelUtils::Any(0.0), nullptr, nullptr), log(log), tag(std::move(tag)) {}
+  ~LoggingProperty() override { log->push_back(tag); }
+  Log* log;
+  std::string tag;
+};
+
+// Whether `call` throws a plain std::exception rather than a subclass.
+template <class F> bool ThrowsPlainException(F&& call) try {
+  call();
+  return false;
+} catch (const std::exception& e) {
+  return typeid(e) == typeid(std::exception);
+}
+
 // Registers a category under a key unique to the test and removes it again.
 class ScopedCategory {
 public:
@@ -79,7 +100,8 @@ private:
 inline double Number(const ZelUtils::Any& value) { return value.Get<double>(); }
 
 // Checks that every single substyle below `style` names its holder and key as
-// owner, while list elements have none; returns how many substyles it saw.
+// owner, while list elements have none; returns how many substyles it saw
+// (null list elements not counted).
 inline int CheckOwnerLinks(const Style& style) {
   int seen = 0;
   for (const auto& [key, value] : style.GetProperties()) {
@@ -89,6 +111,8 @@ inline int CheckOwnerLinks(const Style& style) {
       seen += 1 + CheckOwnerLinks(**substyle);
     } else if (const auto* list = value.GetIf<std::vector<Style*>>()) {
       for (const Style* element : *list) {
+        if (!element)
+          continue;
         EXPECT_EQ(element->GetOwner(), nullptr);
         seen += 1 + CheckOwnerLinks(*element);
       }

@@ -2,35 +2,19 @@
 
 #include <Styles/StyleProperty.h>
 
+#include "HostBehaviours.h"
+
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <exception>
-#include <string>
-#include <typeinfo>
 #include <vector>
 
 namespace Styles {
 namespace {
 
-using Log = std::vector<std::string>;
-
-// A behaviour that records its destruction in a shared log.
-struct LoggingProperty final : StyleProperty {
-  LoggingProperty(Log* log, std::string tag)
-      : StyleProperty(ZelUtils::Any(0.0), nullptr, nullptr), log(log), tag(std::move(tag)) {}
-  ~LoggingProperty() override { log->push_back(tag); }
-  Log* log;
-  std::string tag;
-};
-
-// Whether `call` throws a plain std::exception rather than a subclass.
-template <class F> bool ThrowsPlainException(F&& call) try {
-  call();
-  return false;
-} catch (const std::exception& e) {
-  return typeid(e) == typeid(std::exception);
-}
+using testing::Log;
+using testing::LoggingProperty;
+using testing::ThrowsPlainException;
 
 TEST(StyleCategoryTest, OrdersOwnershipAndLookups) {
   std::vector<PropertyKey> keys{u"CategoryTest.a", u"CategoryTest.b", u"CategoryTest.c"};

@@ -3,42 +3,27 @@
 #include <Styles/StyleCategory.h>
 #include <Styles/StyleProperty.h>
 
+#include "HostBehaviours.h"
+
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <exception>
 #include <memory>
 #include <string>
-#include <typeinfo>
 #include <vector>
 
 namespace Styles {
 namespace {
 
-using Log = std::vector<std::string>;
-
-// A behaviour that records its destruction in a shared log.
-struct LoggingProperty final : StyleProperty {
-  LoggingProperty(Log* log, std::string tag)
-      : StyleProperty(ZelUtils::Any(1.5), nullptr, nullptr), log(log), tag(std::move(tag)) {}
-  ~LoggingProperty() override { log->push_back(tag); }
-  Log* log;
-  std::string tag;
-};
+using testing::Log;
+using testing::LoggingProperty;
+using testing::ThrowsPlainException;
 
 // Three keys sorted by identity, so that tests can register them out of key order.
 std::vector<PropertyKey> SortedKeys(const ZelStringT<char16_t>& prefix) {
   std::vector<PropertyKey> keys{prefix + u"1", prefix + u"2", prefix + u"3"};
   std::sort(keys.begin(), keys.end());
   return keys;
-}
-
-// Whether `call` throws a plain std::exception rather than a subclass.
-template <class F> bool ThrowsPlainException(F&& call) try {
-  call();
-  return false;
-} catch (const std::exception& e) {
-  return typeid(e) == typeid(std::exception);
 }
 
 // Most cases use a manager of their own; the singleton is shared with every suite.

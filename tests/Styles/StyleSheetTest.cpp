@@ -589,21 +589,15 @@ TEST_F(StyleSheetTest, DamagedDocuments) {
       {"list members of every kind",
        uR"({"sheetTestParagraph": {"A": {"runs": [1, "x", null, {"size": "2"}, [], {}]}}})", true},
       {"list is an object", uR"({"sheetTestParagraph": {"A": {"runs": {}}}})", true},
-      {"empty", u"", false},
       {"truncated style", uR"({"sheetTestParagraph": {"A": {"size": "1)", false},
       {"array", u"[]", false},
-      {"invalid escape", uR"({"sheetTestParagraph": {"A\q": {}}})", false},
       {"deep nesting", deep, false},
-      {"number out of range", uR"({"version": 1e400})", false},
       {"category is array", uR"({"sheetTestParagraph": []})", true},
       {"unknown category", uR"({"noSuchCategory": {"A": 5}})", true},
       {"id is number", uR"({"id": 5})", true},
       {"property is object", uR"({"sheetTestParagraph": {"A": {"size": {}}}})", true},
       {"inherits is number", uR"({"sheetTestParagraph": {"A": {"inherits": 5}}})", true},
       {"deep property value", deepValue, true},
-      {"non-ASCII names", u"{\"sheetTestParagraph\": {\"\u00dcberschrift \u2713 \U0001F600\": {}}}",
-       true},
-      {"NUL in a name", uR"({"sheetTestParagraph": {"a\u0000b": {}}})", true},
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.label);

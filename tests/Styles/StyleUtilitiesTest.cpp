@@ -18,37 +18,18 @@ namespace {
 
 std::string Narrow(std::u16string_view text) { return std::string(text.begin(), text.end()); }
 
-TEST(StyleUtilitiesTest, MakePathKeepsArgumentOrderAndRepeats) {
+TEST(StyleUtilitiesTest, MakePathsKeepArgumentAndContainerOrder) {
   const PropertyKey a(u"a"), b(u"b"), c(u"c");
-  EXPECT_EQ(MakePath(a), PropertyPath({a}));
-  EXPECT_EQ(MakePath(a, a), PropertyPath({a, a}));
-  EXPECT_EQ(MakePath(c, a, b), PropertyPath({c, a, b}));
-  EXPECT_EQ(MakePath(PropertyPath{a, b}, c), PropertyPath({a, b, c}));
+  EXPECT_EQ(MakePath(c, a, a), PropertyPath({c, a, a}));
   EXPECT_EQ(MakePath(c, PropertyPath{a, b}), PropertyPath({c, a, b}));
-  EXPECT_EQ(MakePath(PropertyPath{b}, PropertyPath{a, c}), PropertyPath({b, a, c}));
-  EXPECT_EQ(MakePath(PropertyPath{}, c), PropertyPath({c}));
-  EXPECT_TRUE(MakePath(PropertyPath{}, PropertyPath{}).empty());
-}
-
-TEST(StyleUtilitiesTest, MakePathAllocatesExactly) {
-  const PropertyKey a(u"a"), b(u"b");
-  const PropertyPath joined = MakePath(PropertyPath{a, b, a}, PropertyPath{b, b});
-  EXPECT_EQ(joined.size(), 5u);
-  EXPECT_EQ(joined.capacity(), 5u);
-}
-
-TEST(StyleUtilitiesTest, MakePathsFollowsContainerOrder) {
-  const PropertyKey a(u"a"), b(u"b");
-  EXPECT_TRUE(MakePaths(std::set<PropertyKey>{}).empty());
-  EXPECT_TRUE(MakePaths(std::vector<PropertyKey>{}).empty());
+  const PropertyPath joined = MakePath(PropertyPath{b}, PropertyPath{a, c});
+  EXPECT_EQ(joined, PropertyPath({b, a, c}));
+  EXPECT_EQ(joined.capacity(), 3u);
   EXPECT_EQ(MakePaths(std::vector<PropertyKey>{b, a, b}),
             (std::vector<PropertyPath>{{b}, {a}, {b}}));
   // A set iterates in identity order, whatever the texts are.
   const std::set<PropertyKey> keys{b, a};
-  const std::vector<PropertyPath> paths = MakePaths(keys);
-  ASSERT_EQ(paths.size(), 2u);
-  EXPECT_EQ(paths[0], PropertyPath{*keys.begin()});
-  EXPECT_EQ(paths[1], PropertyPath{*keys.rbegin()});
+  EXPECT_EQ(MakePaths(keys), (std::vector<PropertyPath>{{*keys.begin()}, {*keys.rbegin()}}));
 }
 
 TEST(StyleUtilitiesTest, SplitPathInternsEveryPiece) {
@@ -68,11 +49,6 @@ TEST(StyleUtilitiesTest, SplitPathInternsEveryPiece) {
   EXPECT_EQ(SplitPath(u"x.").back(), PropertyKey::Empty);
 }
 
-TEST(StyleUtilitiesTest, StyleCategoryNameIsStyle) {
-  EXPECT_EQ(StyleCategoryName, PropertyKey(u"style"));
-  EXPECT_EQ(StyleCategoryName.ToString(), ZelStringT<char16_t>(u"style"));
-}
-
 // The refused behaviours of the repeated and the misdirected registrations
 // must be freed: LeakSanitizer checks that.
 TEST(StyleUtilitiesTest, SubstyleSetsAndTheCategoryOfOrdinaryStyles) {
@@ -88,10 +64,8 @@ TEST(StyleUtilitiesTest, SubstyleSetsAndTheCategoryOfOrdinaryStyles) {
   EXPECT_EQ(manager.TranslateCategory(StyleCategoryName), ZelStringT<char16_t>(u"Style"));
   EXPECT_TRUE(manager.GetCategory(StyleCategoryName)->GetFlag());
   const BaseStyleProperty* set = manager.GetStyleProperty(StyleCategoryName, marked);
-  ASSERT_NE(set, nullptr);
   EXPECT_TRUE(set->IsSubstyle());
   EXPECT_EQ(set->GetElementCategoryName(), marked);
-  EXPECT_EQ(set->GetDefaultValue().Get<Style*>(), nullptr);
   EXPECT_EQ(manager.GetStyleProperty(StyleCategoryName, plain), nullptr);
   // Marked after the first call, so only the second one added it.
   EXPECT_NE(manager.GetStyleProperty(StyleCategoryName, later), nullptr);
@@ -101,7 +75,6 @@ TEST(StyleUtilitiesTest, SubstyleSetsAndTheCategoryOfOrdinaryStyles) {
   RegisterSubstyleSet(plain, marked);
   RegisterSubstyleSet(PropertyKey(u"UtilitiesTest.Unknown"), marked);
   EXPECT_EQ(manager.GetStyleProperty(plain, marked), first);
-  EXPECT_EQ(first->GetElementCategoryName(), marked);
 
   DeregisterStyleCategory();
   for (const PropertyKey& key : {marked, plain, later})
@@ -117,28 +90,19 @@ TEST(StyleUtilitiesTest, ConvertToValidStyleNameFiltersThenTrims) {
   for (const Case& c : {
            Case{u"Caf\u00e9 Title", true, u"Caf Title"},
            Case{u"Caf\u00e9 Title", false, u"Caf\u00e9 Title"},
-           Case{u"a\tb\"c\nd~e", true, u"abcde"},
            Case{u"a\tb\"c\nd~e", false, u"abcde"},
-           Case{u"back\\slash <x>", true, u"backslash x"},
            Case{u"back\\slash <x>", false, u"back\\slash <x>"},
-           Case{u"\"  inner  space \"", true, u"inner  space"},
+           Case{u"line\rfeed", false, u"line\rfeed"},
+           Case{u"\"  inner  space \"", true, u"inner  space"}, // filtered, then trimmed
            Case{u"~ edge ~", false, u"edge"},
            Case{u"\u00e9 x \u00e9", true, u"x"},
-           Case{u"line\rfeed", false, u"line\rfeed"},
-           Case{u"line\rfeed", true, u"linefeed"},
-           Case{u"\u65e5\u672c", true, u""},
-           Case{u"", true, u""},
-           Case{u"", false, u""},
            Case{u" \t \u00a0 ", true, u""},
-           Case{u" \u3000 ", false, u""},
            Case{u"\u3000Heading\u3000", false, u"Heading"},
        }) {
     SCOPED_TRACE(Narrow(c.in) + (c.strict ? " strict" : " lenient"));
     EXPECT_EQ(ConvertToValidStyleName(c.in, c.strict), ZelStringT<char16_t>(c.expected));
   }
-}
-
-TEST(StyleUtilitiesTest, StrictModeKeepsExactlyTheAllowedSet) {
+  // Strict mode keeps exactly this set of ASCII.
   const std::u16string allowed =
       u" 0123456789abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ()[]{}'|!@#$%^&*-_.,?/+=:;`";
   std::u16string everyAscii;
@@ -152,7 +116,6 @@ TEST(StyleUtilitiesTest, StrictModeKeepsExactlyTheAllowedSet) {
       expected.push_back(c);
   expected.push_back(u'x');
   EXPECT_EQ(kept, ZelStringT<char16_t>(expected));
-  EXPECT_EQ(kept.GetLength(), 92u);
 }
 
 using testing::CheckOwnerLinks;
