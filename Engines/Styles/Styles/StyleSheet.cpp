@@ -68,6 +68,8 @@ public:
   // Whether `child` may inherit from `parent` (false when `child` is `parent`
   // or one of its ancestors); when it may, the new link is recorded.
   bool Link(const Style* child, const Style* parent) {
+    if (child != m_reading)
+      m_substyleLinked = true;
     if (child == parent)
       return false;
     const std::uint32_t above = Load(parent);
@@ -83,6 +85,11 @@ public:
     Attach(node, above);
     return true;
   }
+
+  // The style whose members the import reads; any other child is inside a
+  // style's tree, and only such links can lead back to the style holding them.
+  void SetReading(const Style* style) noexcept { m_reading = style; }
+  bool SubstyleLinked() const noexcept { return m_substyleLinked; }
 
 private:
   static constexpr std::uint32_t kNone = ~std::uint32_t(0);
@@ -213,6 +220,8 @@ private:
   // Each style's node, by open addressing on the style's address.
   std::vector<Slot> m_slots;
   std::vector<const Style*> m_chain; // scratch of Load
+  const Style* m_reading = nullptr;
+  bool m_substyleLinked = false;
 };
 
 // An open-addressing table of index entries keyed by what KeyOf reads from an
@@ -982,6 +991,8 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
   // that inherit their way back to the style holding them: once every link
   // is known, also when a behaviour throws.
   const auto dropContainedParents = [&] {
+    if (!anyReplaced && !m_import->SubstyleLinked())
+      return;
     std::vector<Style*> roots;
     if (anyReplaced) {
       roots = GetStyles();
@@ -1001,6 +1012,7 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
         if (entry->importStamp != stamp)
           continue;
         Style* style = entry->style;
+        m_import->SetReading(style);
         style->SetCategory(categoryKey);
         style->ReadMembers<Access>(*this, Access::RequireObject(Access::Member(category, j)),
                                    scratch);
