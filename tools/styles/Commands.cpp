@@ -111,9 +111,12 @@ int CheckPresetArguments(const std::string& folder, const std::string& set) {
   return kSuccess;
 }
 
-// The preset manager loads sets with a plain import; a damaged set file is
-// caught here first, so that it is reported instead of half read.
-int CheckPresetFile(const std::string& folder, const std::string& set) {
+// CheckPresetArguments, then the set's file: the preset manager loads sets
+// with a plain import, so a damaged file is caught here and reported instead
+// of half read.
+int CheckPresetSet(const std::string& folder, const std::string& set) {
+  if (const int status = CheckPresetArguments(folder, set))
+    return status;
   const std::string path =
       ToUtf8(SystemIO::Path::Combine(FromUtf8(folder), FromUtf8(set + ".qsty")));
   Text text;
@@ -250,7 +253,7 @@ int PresetList(const CommonOptions& options, const std::string& folder, const st
     Output(options.json).Names(presets.GetPresetSetNames());
     return kSuccess;
   }
-  if (const int status = CheckPresetFile(folder, set))
+  if (const int status = CheckPresetSet(folder, set))
     return status;
   if (!presets.GetPresetStyleSheet(FromUtf8(set))) {
     Output::Error(folder, "no preset set \"" + set + "\"");
@@ -262,9 +265,7 @@ int PresetList(const CommonOptions& options, const std::string& folder, const st
 
 int PresetShow(const CommonOptions& options, const std::string& folder, const std::string& set,
                const std::string& name) {
-  if (const int status = CheckPresetArguments(folder, set))
-    return status;
-  if (const int status = CheckPresetFile(folder, set))
+  if (const int status = CheckPresetSet(folder, set))
     return status;
   Styles::FolderPresetManager presets(FromUtf8(folder));
   const StyleSheet* sheet = presets.GetPresetStyleSheet(FromUtf8(set));
@@ -280,9 +281,7 @@ int PresetShow(const CommonOptions& options, const std::string& folder, const st
 int PresetAdd(const CommonOptions& options, const std::string& folder, const std::string& set,
               const std::string& document, const std::string& styleName, const std::string& name,
               bool replace) {
-  if (const int status = CheckPresetArguments(folder, set))
-    return status;
-  if (const int status = CheckPresetFile(folder, set))
+  if (const int status = CheckPresetSet(folder, set))
     return status;
   StyleSheet sheet;
   if (const int status = LoadSheet(document, sheet))
@@ -310,9 +309,7 @@ int PresetAdd(const CommonOptions& options, const std::string& folder, const std
 
 int PresetDelete(const CommonOptions& options, const std::string& folder, const std::string& set,
                  const std::string& name) {
-  if (const int status = CheckPresetArguments(folder, set))
-    return status;
-  if (const int status = CheckPresetFile(folder, set))
+  if (const int status = CheckPresetSet(folder, set))
     return status;
   Styles::FolderPresetManager presets(FromUtf8(folder));
   if (!presets.DoesPresetNameExist(FromUtf8(set), FromUtf8(name))) {
