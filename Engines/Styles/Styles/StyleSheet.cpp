@@ -4,6 +4,7 @@
 #include <Styles/StyleManager.h>
 #include <Styles/StyleProperty.h>
 
+#include <Styles/Internal/DocumentVersion.h>
 #include <Styles/Internal/JsonAccess.h>
 
 #include <Json/Json.h>
@@ -11,8 +12,6 @@
 
 #include <algorithm>
 #include <cassert>
-#include <climits>
-#include <cmath>
 #include <cstdint>
 #include <deque>
 #include <iterator>
@@ -31,19 +30,6 @@ constexpr char16_t k_strExternalID[] = u"id";
 
 // The byte encoding of documents in streams, the same both ways.
 constexpr ZelUtils::TextStream::Encoding kDocumentEncoding = ZelUtils::TextStream::UTF8;
-
-// A document number truncated toward zero into an int; values beyond the
-// range of int are clamped so that no input makes the conversion undefined.
-int TruncateVersion(double number) {
-  if (std::isnan(number))
-    return 0;
-  const double truncated = std::trunc(number);
-  if (truncated <= static_cast<double>(INT_MIN))
-    return INT_MIN;
-  if (truncated >= static_cast<double>(INT_MAX))
-    return INT_MAX;
-  return static_cast<int>(truncated);
-}
 
 // Grows `values` geometrically so that one more push_back cannot throw.
 template <class T> void MakeRoomForOne(std::vector<T>& values) {
@@ -924,7 +910,7 @@ void StyleSheet::ImportMembers(const typename Access::Object& document, bool rep
   const auto applySheetMember = [&](std::u16string_view name, typename Access::Value value) {
     if (const std::optional<double> number = Access::AsNumber(value)) {
       if (name == k_strVersion) {
-        m_version = TruncateVersion(*number);
+        m_version = detail::TruncateVersion(*number);
         versionSeen = true;
       }
     } else if (const std::optional<std::u16string_view> text = Access::AsString(value)) {

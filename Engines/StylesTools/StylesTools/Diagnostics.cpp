@@ -2,6 +2,8 @@
 
 #include <Internal/ToolsSupport.h>
 
+#include <Styles/Internal/DocumentVersion.h>
+
 #include <Styles/StyleCategory.h>
 #include <Styles/StyleManager.h>
 #include <Styles/StyleProperty.h>
@@ -12,8 +14,6 @@
 #include <ZelUtils/String.h>
 
 #include <algorithm>
-#include <climits>
-#include <cmath>
 #include <cstdlib>
 #include <exception>
 #include <map>
@@ -43,18 +43,6 @@ constexpr std::size_t kNone = ~std::size_t(0);
 // The names whose unreadable values a plain import replaces instead of failing.
 bool IsRepairedName(const Text& name) {
   return name == u"xScale" || name == u"yScale" || name == u"angle" || name == u"skew";
-}
-
-// The document's version as the import reads it: truncated, clamped to int.
-int TruncateVersion(double number) {
-  if (std::isnan(number))
-    return 0;
-  const double truncated = std::trunc(number);
-  if (truncated <= static_cast<double>(INT_MIN))
-    return INT_MIN;
-  if (truncated >= static_cast<double>(INT_MAX))
-    return INT_MAX;
-  return static_cast<int>(truncated);
 }
 
 // Line and column (from 1) of a UTF-16 offset, columns in characters.
@@ -201,7 +189,7 @@ private:
   void CheckSheetMember(const Text& name, const Json::Value& value, const Where& where) {
     if (name == kVersion) {
       if (const double* number = value.GetIf<double>()) {
-        m_documentVersion = TruncateVersion(*number);
+        m_documentVersion = Styles::detail::TruncateVersion(*number);
         m_versionSeen = true;
       } else {
         Add(Severity::Error, "wrong-kind", where, u"the version must be a number");
