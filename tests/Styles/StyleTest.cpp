@@ -180,6 +180,41 @@ TEST_F(StyleTest, EqualityAndOrderOnKeysWithoutBehaviour) {
   EXPECT_FALSE(b < a);
 }
 
+// A new category keeps plain values under keys it does not register, with their
+// defined behaviour, and frees only the substyles nobody could destroy later.
+TEST_F(StyleTest, ChangingCategoryKeepsPlainValuesAndFreesOrphanedSubstyles) {
+  ScopedCategory other(u"StyleTest.Other");
+  const PropertyKey plainBorder = other.Number(u"border");
+  Style s(nullptr, para.Key());
+  s.SetProperty(size, Any(12.0));
+  s.SetProperty(indent, Any(3.0));
+  s.SetPathProperty({borderKey, width}, Any(2.0));
+  s.SetCategory(other.Key());
+  EXPECT_EQ(s.GetProperties().Find(borderKey), nullptr); // freed: LeakSanitizer checks
+  ASSERT_NE(s.GetProperties().Find(size), nullptr);
+
+  Style u(nullptr, para.Key());
+  u.SetProperty(size, Any(13.0));
+  u.SetProperty(indent, Any(3.0));
+  u.SetCategory(other.Key());
+  EXPECT_TRUE(s != u);
+  EXPECT_FALSE(s < u || u < s);
+  EXPECT_FALSE(s.IsEmptyWithEmptySubstyles());
+  s.SetProperty(size, Any(1.0)); // moving: no behaviour, the value stays
+  EXPECT_EQ(Number(s.GetProperties().Find(size)[0]), 12.0);
+  const Any one(1.0);
+  s.SetProperty(indent, one); // copying: the value goes
+  EXPECT_EQ(s.GetProperties().Find(indent), nullptr);
+  EXPECT_TRUE(s.RevertAllProperties());
+  EXPECT_TRUE(s.IsEmptyWithEmptySubstyles());
+
+  // A plain value now under a substyle behaviour stays and is destroyed quietly.
+  Style t(nullptr, other.Key());
+  t.SetProperty(plainBorder, Any(4.0));
+  t.SetCategory(para.Key());
+  EXPECT_EQ(Number(t.GetProperties().Find(plainBorder)[0]), 4.0);
+}
+
 // P holds border{width=2, corner{radius=5}}; A inherits from P and holds its
 // own border and corner, neither setting anything.
 TEST_F(StyleTest, OwnerBasedInheritance) {

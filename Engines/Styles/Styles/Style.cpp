@@ -161,11 +161,7 @@ Style& Style::operator=(Style&& other) {
   return *this;
 }
 
-Style::~Style() {
-  for (PropertyMap::Entry& entry : m_properties)
-    if (BaseStyleProperty* behaviour = FindBehaviour(entry.first))
-      behaviour->DestroyPropertyData(entry.second);
-}
+Style::~Style() { DestroyOwnValues(); }
 
 void Style::DestroyValuesAndTakeLinks(const Style& source) {
   DestroyOwnValues();
@@ -175,10 +171,17 @@ void Style::DestroyValuesAndTakeLinks(const Style& source) {
   m_externalName = source.m_externalName;
 }
 
-void Style::DestroyOwnValues() {
-  for (PropertyMap::Entry& entry : m_properties)
-    if (BaseStyleProperty* behaviour = FindBehaviour(entry.first))
-      behaviour->DestroyPropertyData(entry.second);
+void Style::DestroyOwnValues() noexcept {
+  for (PropertyMap::Entry& entry : m_properties) {
+    BaseStyleProperty* behaviour = FindBehaviour(entry.first);
+    try {
+      if (behaviour)
+        behaviour->DestroyPropertyData(entry.second);
+    } catch (...) {
+      // A plain value kept across a change of category, now under a substyle
+      // behaviour, throws std::bad_cast; it owns nothing and needs no freeing.
+    }
+  }
   m_properties.Clear();
 }
 
@@ -202,13 +205,15 @@ void Style::SetCategory(const PropertyKey& name) {
   }
   if (!category || category == m_category)
     return;
-  // A value that the new category has no behaviour of the same kind for could
-  // never be destroyed afterwards: the behaviour that made it frees it now.
+  // Existing values are kept as they are, except substyles that no behaviour of
+  // the new category could destroy: the behaviour that made them frees them now.
   for (std::size_t i = 0; m_category && i < m_properties.size();) {
     PropertyMap::Entry& entry = m_properties[i];
     BaseStyleProperty* behaviour = m_category->GetStyleProperty(entry.first);
     const BaseStyleProperty* next = category->GetStyleProperty(entry.first);
-    if (behaviour && (!next || typeid(*next) != typeid(*behaviour))) {
+    const bool holdsSubstyles = entry.second.IsTypeCompatible<Style*>() ||
+                                entry.second.IsTypeCompatible<std::vector<Style*>>();
+    if (behaviour && holdsSubstyles && (!next || typeid(*next) != typeid(*behaviour))) {
       behaviour->DestroyPropertyData(entry.second);
       m_properties.Erase(PropertyKey(entry.first));
     } else {

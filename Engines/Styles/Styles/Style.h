@@ -427,7 +427,7 @@ private:
 
   // The behaviour of `key` in this style's category, or null.
   BaseStyleProperty* FindBehaviour(const PropertyKey& key) const;
-  void DestroyOwnValues();
+  void DestroyOwnValues() noexcept;
   // DestroyOwnValues, then the source's parent, category and strings.
   void DestroyValuesAndTakeLinks(const Style& source);
   void SetExternalField(ZelStringT<char16_t> Style::*field, const ZelStringT<char16_t>& text);
