@@ -1,5 +1,8 @@
 #include "Commands.h"
 
+#include "Graph.h"
+#include "Report.h"
+
 #include <StylesTools/Diff.h>
 #include <StylesTools/Schema.h>
 
@@ -242,6 +245,27 @@ int Format(const CommonOptions&, const std::string& document, bool compact) {
   Json::Value value{Json::Object()};
   sheet.ExportJson(value, true);
   Output(true).Document(Json::ValueToString(value, !compact));
+  return kSuccess;
+}
+
+int Report(const CommonOptions&, const std::string& document, const std::string& output,
+           const std::string& against) {
+  StyleSheet sheet, oldSheet;
+  if (const int status = LoadSheet(document, sheet))
+    return status;
+  if (!against.empty())
+    if (const int status = LoadSheet(against, oldSheet))
+      return status;
+  return WriteOutput(BuildReport(sheet, DisplayName(document),
+                                 against.empty() ? nullptr : &oldSheet, DisplayName(against)),
+                     output);
+}
+
+int Graph(const CommonOptions&, const std::string& document) {
+  StyleSheet sheet;
+  if (const int status = LoadSheet(document, sheet))
+    return status;
+  WriteDot(sheet, DisplayName(document), std::cout);
   return kSuccess;
 }
 
