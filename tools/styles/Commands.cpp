@@ -35,6 +35,11 @@ Styles::Tools::SchemaRegistration& Registration() {
 
 std::string DisplayName(const std::string& path) { return path == "-" ? "<stdin>" : path; }
 
+// A document's file name without its folder, to title a page or graph.
+std::string TitleOf(const std::string& path) {
+  return std::filesystem::path(DisplayName(path)).filename().string();
+}
+
 // The whole of a file, or of standard input for "-", decoded from UTF-8.
 bool ReadText(const std::string& path, Text& text) {
   ZelUtils::Stream stream;
@@ -256,8 +261,8 @@ int Report(const CommonOptions&, const std::string& document, const std::string&
   if (!against.empty())
     if (const int status = LoadSheet(against, oldSheet))
       return status;
-  return WriteOutput(BuildReport(sheet, DisplayName(document),
-                                 against.empty() ? nullptr : &oldSheet, DisplayName(against)),
+  return WriteOutput(BuildReport(sheet, TitleOf(document), against.empty() ? nullptr : &oldSheet,
+                                 TitleOf(against)),
                      output);
 }
 
@@ -265,7 +270,7 @@ int Graph(const CommonOptions&, const std::string& document) {
   StyleSheet sheet;
   if (const int status = LoadSheet(document, sheet))
     return status;
-  WriteDot(sheet, DisplayName(document), std::cout);
+  WriteDot(sheet, TitleOf(document), std::cout);
   return kSuccess;
 }
 
