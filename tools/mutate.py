@@ -66,6 +66,16 @@ FAULTS = [
     ("equal-unregistered", LIBRARY, "dropped check: a key without behaviour counts as equal",
      "if (!behaviour || !behaviour->IsEqual(mine.second, theirs.second))\n      return false;",
      "if (behaviour && !behaviour->IsEqual(mine.second, theirs.second))\n      return false;"),
+    # Registry
+    ("reverse-order", LIBRARY, "wrong order: behaviours deleted in registration order",
+     "for (auto key = m_categoryOrder.rbegin(); key != m_categoryOrder.rend(); ++key) {",
+     "for (auto key = m_categoryOrder.begin(); key != m_categoryOrder.end(); ++key) {"),
+    ("untranslate-no-case", LIBRARY, "wrong comparison: UI names match in any letter case",
+     "if (entry.second->GetUIName().Compare(uiName, kCompareCaseSensitive) == 0)",
+     "if (entry.second->GetUIName().CompareNoCase(uiName) == 0)"),
+    ("substyle-set-flag", LIBRARY, "dropped check: every category joins the ordinary styles",
+     "  if (addToStyleCategory)\n    m_substyleSetCategories.push_back(key);",
+     "  m_substyleSetCategories.push_back(key);"),
     # Substyles
     ("substyle-no-owner", LIBRARY, "missing call: a copied substyle names no owner",
      "  Style* copy = new Style(*source);\n  copy->SetOwner(owner, GetName());",
