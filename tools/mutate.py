@@ -173,6 +173,12 @@ FAULTS = [
      "return differences.empty() ? kSuccess : kNegative;", "return kSuccess;"),
     ("stdin-name", COMMAND, "wrong value: standard input is not named as such",
      'return path == "-" ? "<stdin>" : path;', "return path;"),
+    ("report-script-escape", COMMAND, "wrong value: the report's data lets \"</script>\" end its script",
+     "if (c == u'<')", "if (c == u'>')"),
+    ("graph-dot-escape", COMMAND, "dropped check: DOT text leaves backslashes unescaped",
+     "if (c == '\"' || c == '\\\\')", "if (c == '\"')"),
+    ("graph-list-index", COMMAND, "off by one: substyle list paths count from 1",
+     "FromUtf8(std::to_string(i))", "FromUtf8(std::to_string(i + 1))"),
 ]
 
 
