@@ -133,12 +133,14 @@ std::string BuildReport(const StyleSheet& sheet, const std::string& title,
       if (categoryIndex.emplace(old.key, categories.size()).second)
         categories.push_back(CategoryStyles{old.key, old.name, {}});
 
+  // Styles are numbered in the order they are written into the page.
   std::unordered_map<const Style*, std::size_t> indexOf;
   std::vector<NameToIndex> byName(categories.size());
+  std::size_t count = 0;
   for (std::size_t c = 0; c < categories.size(); ++c)
     for (const auto& [name, style] : categories[c].styles) {
-      byName[c].emplace(name, indexOf.size());
-      indexOf.emplace(style, indexOf.size());
+      byName[c].emplace(name, count);
+      indexOf.emplace(style, count++);
     }
 
   Json::Array styles;
@@ -147,11 +149,14 @@ std::string BuildReport(const StyleSheet& sheet, const std::string& title,
       styles.AddValue(Json::Value(DescribeStyleData(sheet, name, *style, c, indexOf)));
 
   // Differences go to the style they concern; removed styles to their category.
-  std::vector<Json::Array> changes(indexOf.size());
+  std::vector<Json::Array> changes(count);
   std::vector<Json::Array> removed(categories.size());
   if (oldSheet)
     for (const Difference& d : Styles::Tools::DiffSheets(*oldSheet, sheet, true)) {
-      const std::size_t c = categoryIndex.at(d.category.GetString());
+      const auto category = categoryIndex.find(d.category.GetString());
+      if (category == categoryIndex.end())
+        continue;
+      const std::size_t c = category->second;
       if (d.kind == Difference::Kind::Removed) {
         removed[c].AddValue(Json::Value(d.style));
         continue;
