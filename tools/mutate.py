@@ -244,7 +244,7 @@ def test(build_dir, log):
         for program in gtest_programs(build_dir):
             result = subprocess.run([program, "--gtest_fail_fast", "--gtest_brief=1"],
                                     cwd=os.path.dirname(program),
-                                    stdout=log, stderr=subprocess.STDOUT, env=env, timeout=900)
+                                    stdout=log, stderr=subprocess.STDOUT, env=env, timeout=300)
             if result.returncode != 0:
                 return result.returncode
         others = other_tests(build_dir)
