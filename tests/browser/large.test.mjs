@@ -20,16 +20,21 @@ test('search in a 5,000-style report answers quickly', async () => {
     const loaded = await tab.evaluate(() => window.reportReady);
     assert.ok(await tab.locator('g.node').count() <= 160, 'the graph starts folded');
 
-    // The search, the choice of its first result and the redrawing, timed in the page.
-    const searched = await tab.evaluate(() => {
-      const started = performance.now();
-      const input = document.getElementById('search');
-      input.value = 'STYLE 4321';
-      input.dispatchEvent(new Event('input'));
-      document.querySelector('#results li[data-select]').click();
-      document.body.getBoundingClientRect();
-      return performance.now() - started;
-    });
+    // A search, the choice of its first result and the redrawing, timed in
+    // the page; the median of three names in letter cases the page does not use.
+    const times = [];
+    for (const name of ['STYLE 4999', 'style 2500', 'STYLE 4321']) {
+      times.push(await tab.evaluate(text => {
+        const started = performance.now();
+        const input = document.getElementById('search');
+        input.value = text;
+        input.dispatchEvent(new Event('input'));
+        document.querySelector('#results li[data-select]').click();
+        document.body.getBoundingClientRect();
+        return performance.now() - started;
+      }, name));
+    }
+    const searched = times.sort((a, b) => a - b)[1];
     assert.equal(await tab.textContent('#details h2'), 'Style 4321');
     assert.equal(await tab.getAttribute('g.node.selected', 'data-name'), 'Style 4321');
     console.log(`page ready after ${loaded.toFixed(0)} ms, search answered in ${searched.toFixed(1)} ms`);
