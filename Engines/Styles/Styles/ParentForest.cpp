@@ -1,4 +1,5 @@
-// The parent forest's splay trees and its table of styles.
+// The parent forest's splay trees and its table of styles by address; the
+// sheet consults it while the document reader runs.
 #include <Styles/Internal/ParentForest.h>
 
 #include <Styles/Style.h>

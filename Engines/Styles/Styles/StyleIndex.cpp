@@ -1,4 +1,5 @@
-// The name index's filing, re-spelling, erasing and name ordering.
+// The name index's filing, re-spelling, erasing and name ordering; the
+// sheet owns one, and the document reader and writer walk it.
 #include <Styles/Internal/StyleIndex.h>
 
 #include <Styles/Internal/SortRuns.h>

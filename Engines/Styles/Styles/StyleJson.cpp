@@ -1,4 +1,5 @@
-// One style's JSON object, and Style's operations that write or read it.
+// One style's JSON object, and Style's operations that write or read it;
+// the document reader and writer go through it for every style.
 #include <Styles/Internal/StyleJson.h>
 
 #include <Styles/StyleCategory.h>

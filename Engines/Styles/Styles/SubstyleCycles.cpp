@@ -1,4 +1,5 @@
-// Dropping the substyle parents that lead back to the style holding them.
+// Dropping the substyle parents that lead back to the style holding them,
+// which the document reader does once an import has made every link.
 #include <Styles/Internal/SubstyleCycles.h>
 
 #include <Styles/StyleCategory.h>
