@@ -43,6 +43,9 @@ class Style;
 class StyleCategory;
 class StyleSheet;
 class BaseStyleProperty;
+namespace detail {
+class StyleJson;
+} // namespace detail
 
 /// The JSON value written and read by styles and behaviours.
 using JsonValue = Json::Value;
@@ -433,8 +436,6 @@ private:
   void SetExternalField(ZelStringT<char16_t> Style::*field, const ZelStringT<char16_t>& text);
   // Takes over the parent's own values, then inherits from its parent.
   void MergeParent();
-  // Whether this style is `style` or one of its ancestors.
-  bool IsAncestorOrSelf(const Style* style) const noexcept;
   // Whether one of the style's own values depends on `styles`.
   bool ValuesDepend(StyleSpan styles, bool parentOnly) const;
   // Whether an ancestor is in `styles` or holds a value depending on them.
@@ -442,25 +443,8 @@ private:
   // Appends the dependencies of the style's own values.
   void AppendValueDependencies(StyleSpan styles, bool parentOnly, std::vector<Style*>& out) const;
 
-  friend class StyleSheet;
-  // Reads the members of a style's JSON object, held as Access describes it
-  // (a value tree or a compact document); `scratch` is reused for values.
-  template <class Access>
-  void ReadMembers(const StyleSheet& sheet, const typename Access::Object& object,
-                   JsonValue& scratch);
-  // The style that an "inherits" member names, after the import bookkeeping:
-  // null for a name it says to ignore, or a name the sheet lacks.
-  static Style* ResolveParent(const StyleSheet& sheet, std::u16string_view name);
-  // Hands the members of the style's JSON object to `sink`, in their order.
-  template <class Sink>
-  void SerializeMembers(const StyleSheet& sheet, bool includeTemporary, Sink& sink) const;
-  // Writes the style's JSON object; `scratch` is reused for the values.
-  void WriteJson(const StyleSheet& sheet, Json::Writer& writer, bool includeTemporary,
-                 JsonValue& scratch) const;
-  // Appends to `out`, in their order, the styles of `styles` for which
-  // HasDependency(span, false) holds, answering every shared ancestor once.
-  static void AppendDependents(const std::vector<Style*>& styles, StyleSpan span,
-                               std::vector<Style*>& out);
+  // Reads and writes the style's JSON members.
+  friend class detail::StyleJson;
   const ZelUtils::Any& DefaultValue(const PropertyKey& key) const;
 
   PropertyMap m_properties;

@@ -20,8 +20,11 @@
 namespace Styles {
 
 namespace detail {
+class DocumentReader;
+class DocumentWriter;
 class ParentForest;
 class StyleIndex;
+class StyleJson;
 } // namespace detail
 
 /// Told about every style that StyleSheet::CopyContentsFrom creates.
@@ -186,21 +189,16 @@ public:
   bool Import(ZelUtils::Stream& stream, bool replace);
 
 private:
-  friend class Style;
+  // The document reader and writer, and one style's JSON, work on the index.
+  friend class detail::DocumentReader;
+  friend class detail::DocumentWriter;
+  friend class detail::StyleJson;
 
   // Makes every style of the sheet that refers to an old style of `heirs`
   // (styles no longer in the sheet) refer to its heir instead; a style that
   // an heir is or inherits from, or every one when an heir is null, takes
   // over the old style's values instead.
   void Redirect(const std::map<Style*, Style*>& heirs);
-  // Imports the members of a document held as Access describes it (a value
-  // tree or a compact document): ImportJson's work for either.
-  template <class Access> void ImportMembers(const typename Access::Object& document, bool replace);
-  // Drops the parent of every substyle, in the trees of `roots` and of the
-  // styles they lead to, whose parent leads back (through parents and other
-  // substyles' parents) to the style holding it: it would take values from
-  // a style holding it, which flattening or repairing copies without end.
-  static void DropSubstyleCycles(const std::vector<Style*>& roots);
   // The style filed under `name` in any letter case, or null.
   Style* FindStyle(std::u16string_view name) const;
   // The name `style` is filed under, not copied; empty when it is not filed.

@@ -1,0 +1,43 @@
+// One style's JSON object: writing its members (to a value tree or straight
+// into text) and reading them back, parent names resolved in a sheet. Used by
+// Style's own JSON operations and by the document reader and writer.
+#pragma once
+
+#include <Styles/Style.h>
+
+#include <string_view>
+
+namespace Json {
+class Writer;
+} // namespace Json
+
+namespace Styles {
+namespace detail {
+
+class StyleJson {
+public:
+  // Reads the members of a style's object, held as Access describes it (a
+  // value tree or a compact document), into `style`; `scratch` is reused for
+  // values. Exceptions of behaviours pass through.
+  template <class Access>
+  static void Read(Style& style, const StyleSheet& sheet, const typename Access::Object& object,
+                   JsonValue& scratch);
+  // Fills `out` with the style's object as a value tree.
+  static void Write(const Style& style, const StyleSheet& sheet, JsonValue& out,
+                    bool includeTemporary);
+  // Writes the style's object as text; `scratch` is reused for the values.
+  static void Write(const Style& style, const StyleSheet& sheet, Json::Writer& writer,
+                    bool includeTemporary, JsonValue& scratch);
+
+private:
+  // Hands the members of the style's object to `sink`, in their order.
+  template <class Sink>
+  static void WriteMembers(const Style& style, const StyleSheet& sheet, bool includeTemporary,
+                           Sink& sink);
+  // The style that an "inherits" member names, after the manager's import
+  // settings: null for a name they say to ignore, or a name the sheet lacks.
+  static Style* ResolveParent(const StyleSheet& sheet, std::u16string_view name);
+};
+
+} // namespace detail
+} // namespace Styles

@@ -1,0 +1,200 @@
+// One style's JSON object, and Style's operations that write or read it;
+// the document reader and writer go through it for every style.
+#include <Styles/Internal/StyleJson.h>
+
+#include <Styles/StyleCategory.h>
+#include <Styles/StyleManager.h>
+#include <Styles/StyleProperty.h>
+#include <Styles/StyleSheet.h>
+
+#include <Styles/Internal/JsonAccess.h>
+
+#include <Json/Json.h>
+
+#include <memory>
+#include <optional>
+#include <utility>
+#include <vector>
+
+namespace Styles {
+
+namespace {
+
+// Fixed member names of a style's JSON object.
+constexpr std::u16string_view k_strPropertyInherits = u"inherits";
+constexpr std::u16string_view k_strExternalID = u"id";
+constexpr std::u16string_view k_strExternalName = u"original";
+
+// Where StyleJson::WriteMembers puts the members of a style: a value tree.
+class TreeSink {
+public:
+  explicit TreeSink(Json::Object& object) : m_object(object) {}
+  void Text(std::u16string_view name, std::u16string_view text) {
+    m_object.AddValue(ZelStringT<char16_t>(name), Json::Value(ZelStringT<char16_t>(text)));
+  }
+  Json::Value& Value() { return m_value = Json::Value(); }
+  void Member(const ZelStringT<char16_t>& name) { m_object.AddValue(name, std::move(m_value)); }
+
+private:
+  Json::Object& m_object;
+  Json::Value m_value;
+};
+
+// The same members written straight into JSON text.
+class WriterSink {
+public:
+  WriterSink(Json::Writer& writer, Json::Value& scratch) : m_writer(writer), m_value(scratch) {}
+  void Text(std::u16string_view name, std::u16string_view text) {
+    m_writer.Key(name);
+    m_writer.String(text);
+  }
+  Json::Value& Value() { return m_value; }
+  void Member(const ZelStringT<char16_t>& name) {
+    m_writer.Key(name.GetView());
+    m_writer.Write(m_value);
+  }
+
+private:
+  Json::Writer& m_writer;
+  Json::Value& m_value;
+};
+
+} // namespace
+
+namespace detail {
+
+template <class Sink>
+void StyleJson::WriteMembers(const Style& style, const StyleSheet& sheet, bool includeTemporary,
+                             Sink& sink) {
+  const std::u16string_view parentName = sheet.FindStyleName(style.GetParent());
+  if (!parentName.empty())
+    sink.Text(k_strPropertyInherits, parentName);
+  if (!style.GetExternalID().IsEmpty())
+    sink.Text(k_strExternalID, style.GetExternalID().GetView());
+  if (!style.GetExternalName().IsEmpty())
+    sink.Text(k_strExternalName, style.GetExternalName().GetView());
+  for (const PropertyMap::Entry& entry : style.GetProperties()) {
+    const BaseStyleProperty* behaviour = style.FindBehaviour(entry.first);
+    if (!behaviour || (!includeTemporary && behaviour->IsTemporary()))
+      continue;
+    if (behaviour->Serialize(sheet, &style, entry.second, sink.Value()))
+      sink.Member(entry.first.GetString());
+  }
+}
+
+void StyleJson::Write(const Style& style, const StyleSheet& sheet, JsonValue& out,
+                      bool includeTemporary) {
+  Json::Object& object = out.Emplace<Json::Object>();
+  object.Reserve(style.GetProperties().size() + 3);
+  TreeSink sink(object);
+  WriteMembers(style, sheet, includeTemporary, sink);
+}
+
+void StyleJson::Write(const Style& style, const StyleSheet& sheet, Json::Writer& writer,
+                      bool includeTemporary, JsonValue& scratch) {
+  writer.StartObject();
+  WriterSink sink(writer, scratch);
+  WriteMembers(style, sheet, includeTemporary, sink);
+  writer.EndObject();
+}
+
+template <class Access>
+void StyleJson::Read(Style& style, const StyleSheet& sheet, const typename Access::Object& object,
+                     JsonValue& scratch) {
+  const std::shared_ptr<const StyleCategory> category = style.GetCategory();
+  std::vector<std::pair<const BaseStyleProperty*, typename Access::Value>> deprecated;
+  std::vector<const BaseStyleProperty*> needAdjustment;
+  const std::size_t count = Access::Size(object);
+  // Room for the members that can be properties, in one step.
+  std::size_t fixedMembers = 0;
+  for (std::size_t i = 0; i < count; ++i) {
+    const std::u16string_view name = Access::Name(object, i);
+    fixedMembers +=
+        name == k_strPropertyInherits || name == k_strExternalID || name == k_strExternalName;
+  }
+  style.m_properties.Reserve(style.m_properties.size() + count - fixedMembers);
+  for (std::size_t i = 0; i < count; ++i) {
+    const std::u16string_view name = Access::Name(object, i);
+    const typename Access::Value value = Access::Member(object, i);
+    if (name == k_strPropertyInherits) {
+      const std::optional<std::u16string_view> parentName = Access::AsString(value);
+      if (!parentName || parentName->empty())
+        continue;
+      Style* parent = ResolveParent(sheet, *parentName);
+      // Never this style itself, nor a style that already inherits from it:
+      // a parent cycle would make every lookup endless.
+      if (parent && sheet.AcceptParent(style, *parent))
+        style.SetParent(parent);
+    } else if (name == k_strExternalID) {
+      const std::optional<std::u16string_view> id = Access::AsString(value);
+      if (id && !id->empty())
+        style.SetExternalID(ZelStringT<char16_t>(*id));
+    } else if (name == k_strExternalName) {
+      const std::optional<std::u16string_view> externalName = Access::AsString(value);
+      if (externalName && !externalName->empty())
+        style.SetExternalName(ZelStringT<char16_t>(*externalName));
+    } else {
+      // Found by its text, so that names from documents are never pooled.
+      const BaseStyleProperty* behaviour = category ? category->FindStyleProperty(name) : nullptr;
+      if (!behaviour)
+        continue;
+      if (behaviour->IsDeprecated()) {
+        deprecated.emplace_back(behaviour, value);
+        continue;
+      }
+      behaviour->Deserialize(sheet, &style, Access::ForBehaviour(value, scratch));
+      if (behaviour->NeedAdjustementsForStyleIO())
+        needAdjustment.push_back(behaviour);
+    }
+  }
+  // Deprecated properties are read after all current ones, deliberately.
+  for (const auto& [behaviour, value] : deprecated)
+    behaviour->Deserialize(sheet, &style, Access::ForBehaviour(value, scratch));
+  for (const BaseStyleProperty* behaviour : needAdjustment)
+    behaviour->AdjustAfterDeserialize(sheet, &style);
+}
+
+Style* StyleJson::ResolveParent(const StyleSheet& sheet, std::u16string_view name) {
+  const WImportStyleInfo& info = GetStyleManager().GetImportStyleInfo();
+  if (!info.names.empty() || !info.renames.empty()) {
+    const ZelStringT<char16_t> text(name);
+    if (info.names.count(text))
+      return nullptr;
+    const auto renamed = info.renames.find(text);
+    if (renamed != info.renames.end())
+      return sheet.GetStyle(renamed->second);
+  }
+  return sheet.FindStyle(name);
+}
+
+template void StyleJson::Read<TreeAccess>(Style&, const StyleSheet&, const Json::Object&,
+                                          JsonValue&);
+template void StyleJson::Read<DocumentAccess>(Style&, const StyleSheet&, const Json::Document::Ref&,
+                                              JsonValue&);
+
+} // namespace detail
+
+void Style::Serialize(const StyleSheet& sheet, JsonValue& out, bool includeTemporary) const {
+  detail::StyleJson::Write(*this, sheet, out, includeTemporary);
+}
+
+ZelStringT<char16_t> Style::Serialize(const StyleSheet& sheet, bool format,
+                                      bool includeTemporary) const {
+  Json::Value value;
+  Serialize(sheet, value, includeTemporary);
+  return Json::ValueToString(value, format);
+}
+
+void Style::DeserializeJson(const StyleSheet& sheet, const Json::Object& object) {
+  JsonValue scratch;
+  detail::StyleJson::Read<detail::TreeAccess>(*this, sheet, object, scratch);
+}
+
+Style* Style::Deserialize(const StyleSheet& sheet, const Json::Object& object,
+                          const PropertyKey& category) {
+  std::unique_ptr<Style> style(new Style(nullptr, category));
+  style->DeserializeJson(sheet, object);
+  return style.release();
+}
+
+} // namespace Styles
