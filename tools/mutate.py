@@ -114,9 +114,9 @@ FAULTS = [
      "if (!behaviour || (includeTemporary && behaviour->IsTemporary()))"),
     # Sheets
     ("cycle-refusal", LIBRARY, "inverted condition: import accepts a parent that closes a cycle",
-     "    if (FindRoot(above) == node) {", "    if (FindRoot(above) != node) {"),
+     "if (FindRoot(above) == node) {", "if (FindRoot(above) != node) {"),
     ("cycle-self", LIBRARY, "dropped check: import lets a style inherit from itself",
-     "    if (child == parent)\n      return false;\n", ""),
+     "if (child == parent)", "if (false)"),
     ("delete-no-repair", LIBRARY, "missing call: deleting styles leaves children pointing at them",
      "      style->RemoveDependency(doomed, true);\n  for (Style* style : styles) {",
      "      (void)style;\n  for (Style* style : styles) {"),
