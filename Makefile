@@ -28,7 +28,7 @@ VERSION := $(shell sed -n 's/^project.Styles VERSION \([0-9.]*\).*/\1/p' CMakeLi
 
 CMAKE_FLAGS := -DCMAKE_BUILD_TYPE=$(BUILD_TYPE) -DSTYLES_WARNINGS_AS_ERRORS=$(WERROR)
 
-.PHONY: all deps docs-deps configure build test test-asan bench fuzz demo docs install format clean
+.PHONY: all deps docs-deps configure build test test-asan test-ratio mutate bench fuzz demo docs install format clean
 
 all: build
 
@@ -68,6 +68,15 @@ test-asan: deps
 	cmake --build $(ASAN_BUILD_DIR) -j $(JOBS)
 	cd $(ASAN_BUILD_DIR) && ASAN_OPTIONS=detect_leaks=1:strict_string_checks=1 \
 	  UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1 ctest --output-on-failure -j $(JOBS)
+
+# Test code as a share of the rest; fails above 0.38.
+test-ratio:
+	tools/test-ratio.sh
+
+# Plants single faults one at a time in a sanitizer build and reports which
+# ones the suite catches (tens of minutes).
+mutate: deps
+	python3 tools/mutate.py
 
 bench: deps
 	cmake -S . -B $(BENCH_BUILD_DIR) -DCMAKE_BUILD_TYPE=Release -DSTYLES_BUILD_BENCHMARKS=ON \
@@ -124,4 +133,4 @@ format:
 	find Engines tests benchmarks examples fuzz -name '*.h' -o -name '*.cpp' | xargs clang-format -i
 
 clean:
-	rm -rf $(BUILD_DIR) $(ASAN_BUILD_DIR) $(BENCH_BUILD_DIR) $(DOCS_BUILD_DIR) $(FUZZ_BUILD_DIR)
+	rm -rf $(BUILD_DIR) $(ASAN_BUILD_DIR) build-mutate $(BENCH_BUILD_DIR) $(DOCS_BUILD_DIR) $(FUZZ_BUILD_DIR)
