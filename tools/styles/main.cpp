@@ -3,6 +3,7 @@
 // versions, and manages preset files. Commands take files or "-" for
 // standard input; see Commands.h for the exit statuses.
 #include "Commands.h"
+#include "WordDocuments.h"
 
 #include <CLI/CLI.hpp>
 
@@ -57,6 +58,13 @@ int main(int argc, char** argv) {
   format->add_option("document", document, "Document, or -")->required();
   format->add_flag("--compact", compact, "One line instead of indented text");
 
+  std::string into, output = "-";
+  CLI::App* convert = app.add_subcommand(
+      "convert", "Convert between a JSON document and a Word file (a Word file gives JSON)");
+  convert->add_option("input", document, "Document or Word file, or -")->required();
+  convert->add_option("--into", into, "Write the styles into a copy of this Word package");
+  convert->add_option("-o,--output", output, "Output file (default: standard output)");
+
   CLI::App* preset = app.add_subcommand("preset", "Work on preset files in a folder");
   preset->require_subcommand(1);
   CLI::App* presetList = preset->add_subcommand("list", "List the sets, or the presets of SET");
@@ -75,8 +83,8 @@ int main(int argc, char** argv) {
   presetAdd->add_option("--name", name, "Preset name (default: the style's name)");
   presetAdd->add_flag("--replace", replace, "Replace a preset of that name");
 
-  for (CLI::App* command : {validate, list, show, flatten, diff, format, presetList, presetShow,
-                            presetAdd, presetDelete})
+  for (CLI::App* command : {validate, list, show, flatten, diff, format, convert, presetList,
+                            presetShow, presetAdd, presetDelete})
     AddCommonOptions(*command, options);
 
   try {
@@ -86,7 +94,11 @@ int main(int argc, char** argv) {
   }
 
   int status = kSuccess;
-  if (!RegisterSchemaFile(options.schema, status))
+  // Word files are read under the Word schema unless a schema is named.
+  std::vector<std::string> inputs = documents;
+  inputs.insert(inputs.end(), {document, otherDocument});
+  const bool word = options.schema.empty() && (convert->parsed() || AnyWordDocument(inputs));
+  if (word ? !RegisterWordSchema(status) : !RegisterSchemaFile(options.schema, status))
     return status;
   try {
     if (validate->parsed())
@@ -101,6 +113,8 @@ int main(int argc, char** argv) {
       status = Diff(options, document, otherDocument, effective);
     else if (format->parsed())
       status = Format(options, document, compact);
+    else if (convert->parsed())
+      status = Convert(options, document, into, output);
     else if (presetList->parsed())
       status = PresetList(options, folder, set);
     else if (presetShow->parsed())
@@ -115,6 +129,6 @@ int main(int argc, char** argv) {
     Output::Error("", std::string("cannot complete the command: ") + error.what());
     status = kUnusable;
   }
-  DeregisterSchemaFile();
+  word ? DeregisterWordSchema() : DeregisterSchemaFile();
   return status;
 }
