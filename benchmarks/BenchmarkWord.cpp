@@ -51,9 +51,8 @@ void RegisterWord() {
 
 void SetCounters(benchmark::State& state, std::size_t bytes) {
   state.SetBytesProcessed(static_cast<std::int64_t>(state.iterations() * bytes));
-  state.counters["styles/s"] =
-      benchmark::Counter(164.0 * static_cast<double>(state.iterations()),
-                         benchmark::Counter::kIsRate);
+  state.counters["styles/s"] = benchmark::Counter(164.0 * static_cast<double>(state.iterations()),
+                                                  benchmark::Counter::kIsRate);
 }
 
 void BM_ReadWordTemplate(benchmark::State& state) {

@@ -457,6 +457,16 @@ const char* RawKey(Container container) {
   }
 }
 
+const PropertyKey& RawPropertyKey(Container container) {
+  static const std::vector<PropertyKey> keys = [] {
+    std::vector<PropertyKey> made;
+    for (Container c : {C::Style, C::Paragraph, C::Run, C::Table, C::Row, C::Cell})
+      made.emplace_back(Widen(RawKey(c)));
+    return made;
+  }();
+  return keys[static_cast<std::size_t>(container)];
+}
+
 int ChildRank(Container container, std::string_view element) {
   const std::vector<const char*>& order = Orders()[static_cast<std::size_t>(container)];
   for (std::size_t i = 0; i < order.size(); ++i)

@@ -74,6 +74,8 @@ bool IsConditionalFormat(std::string_view type);
 /// The key that keeps a container's unmapped children as XML text; it is set
 /// (maybe to "") whenever the container element is present.
 const char* RawKey(Container container);
+/// RawKey as an interned key.
+const PropertyKey& RawPropertyKey(Container container);
 /// The rank of a child element name in its container's schema order; -1 for a
 /// name the order does not know.
 int ChildRank(Container container, std::string_view element);

@@ -85,9 +85,17 @@ private:
     if (!m_quiet)
       m_report.warnings.push_back(MakeProblem(m_part, element, message));
   }
-  static PropertyKey Key(const char* key) { return PropertyKey(Widen(key)); }
+  static PropertyKey Key(const char* key) {
+    // The keys of substyles and categories come up for every style.
+    static const PropertyKey paragraph(u"paragraph"), character(u"character");
+    if (std::strcmp(key, "paragraph") == 0)
+      return paragraph;
+    if (std::strcmp(key, "character") == 0)
+      return character;
+    return PropertyKey(Widen(key));
+  }
   void AppendRaw(Style& style, Container container, const std::string& xml) {
-    const PropertyKey key = Key(detail::RawKey(container));
+    const PropertyKey& key = detail::RawPropertyKey(container);
     const Any* raw = style.GetProperties().Find(key);
     const Text* text = raw ? raw->GetIf<Text>() : nullptr;
     style.SetProperty(key, Any((text ? *text : Text()) + Widen(xml)));
@@ -107,6 +115,7 @@ private:
   detail::ThemeFonts m_theme;
   Style* m_partStyle = nullptr;
   std::map<std::string, Style*> m_roots;
+  std::map<std::u16string, int> m_nextNumber;
   bool m_quiet = false;
   std::string m_context; // the style being read, for warnings
 };
@@ -116,7 +125,12 @@ Style* PartReader::AddStyle(const Text& name, const PropertyKey& category,
   Style* style = new Style(nullptr, category);
   Text filed = name;
   if (m_sheet.GetStyle(name)) {
-    filed = m_sheet.GetUnusedStyleName(name);
+    // Numbered on from the last number given to this name, so that many
+    // styles of one name take linear time.
+    int& next = m_nextNumber[std::u16string(name.GetView())];
+    do
+      filed = name + u" " + Widen(std::to_string(++next));
+    while (m_sheet.GetStyle(filed));
     style->SetExternalName(externalName);
   }
   m_sheet.AddStyle(filed, style, false);

@@ -102,7 +102,10 @@ void PartWriter::AppendRaw(const std::string& xml, pugi::xml_node parent) {
 
 void PartWriter::CollectItems(Container container, const Style& style, std::vector<Item>& items) {
   pugi::xml_node holder = m_scratch.append_child("holder");
-  AppendRaw(OwnText(style, detail::RawKey(container)), holder);
+  const Any* raw = style.GetProperties().Find(detail::RawPropertyKey(container));
+  const Text* rawText = raw ? raw->GetIf<Text>() : nullptr;
+  if (rawText && !rawText->IsEmpty())
+    AppendRaw(Narrow(*rawText), holder);
   std::set<const detail::Group*> covered;
   int rank = -1;
   for (const pugi::xml_node child : holder.children()) {
@@ -144,7 +147,7 @@ void PartWriter::WriteContainer(Container container, const Style* style, const c
     return;
   std::vector<Item> children;
   CollectItems(container, *style, children);
-  if (children.empty() && !style->GetProperties().Find(Key(detail::RawKey(container))))
+  if (children.empty() && !style->GetProperties().Find(detail::RawPropertyKey(container)))
     return;
   pugi::xml_node element = m_scratch.append_child(name);
   AppendSorted(children, element);
