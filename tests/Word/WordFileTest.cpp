@@ -180,6 +180,16 @@ TEST_F(WordFileTest, DefaultTemplateValuesFollowWordsRules) {
             sheet.GetStyle(u"Heading 1")->GetSubstyle(PropertyKey(u"character"), false));
 }
 
+TEST_F(WordFileTest, SheetFromJsonWritesWordsUnitsOrderAndIds) {
+  // Styles made outside Word: IDs from their names, chains from the defaults
+  // without w:basedOn, points back to Word's units, children in Word's order.
+  const std::string folder = STYLES_WORD_DATA;
+  StyleSheet sheet;
+  ASSERT_TRUE(sheet.ImportFromString(U16(Slurp(folder + "/from-json.json")), false));
+  const std::string written = WriteStylesPart(sheet);
+  EXPECT_TRUE(SameXml(written, Slurp(folder + "/from-json.xml"))) << written;
+}
+
 TEST_F(WordFileTest, HostileFilesFailOrWarnClearly) {
   // Each line of cases.txt: file, "error", "warning" or "ok", and a text the
   // problems' parts, elements and messages must hold.
