@@ -81,11 +81,17 @@ Diagnostic AsDiagnostic(const Styles::Word::Problem& problem, Severity severity)
 } // namespace
 
 bool IsWordDocument(const std::string& path) {
+  // A package starts with "PK", XML with "<" (after a byte order mark); a JSON
+  // document with neither, and is left unread for the JSON reader.
   if (path == "-" && !StandardInput()) {
-    // A package starts with "PK", XML with "<"; a JSON document with neither,
-    // and is left unread for the JSON reader.
     const int first = std::cin.peek();
-    if (first != 'P' && first != '<')
+    if (first != 'P' && first != '<' && first != 0xEF)
+      return false;
+  } else if (path != "-") {
+    std::ifstream file(path, std::ios::binary);
+    char start[3] = {};
+    file.read(start, sizeof start);
+    if (start[0] != 'P' && start[0] != '<' && start[0] != '\xEF')
       return false;
   }
   std::string bytes;
