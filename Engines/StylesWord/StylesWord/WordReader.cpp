@@ -169,8 +169,9 @@ void PartReader::ReadChildren(Container container, const pugi::xml_node& element
 
 void PartReader::ReadTableFormat(const pugi::xml_node& node, Style& table) {
   const std::string type = node.attribute("w:type").value();
-  const PropertyKey key(Widen(type));
+  // Only known names become keys: a file cannot grow the process's key pool.
   const bool known = detail::IsConditionalFormat(type);
+  const PropertyKey key = known ? PropertyKey(Widen(type)) : PropertyKey();
   if (!known || table.GetSubstyle(key, false)) {
     Warn("w:tblStylePr \"" + type + "\"",
          known ? "repeats a conditional format; kept as it is written"
