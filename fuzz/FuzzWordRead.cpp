@@ -1,6 +1,7 @@
 // ReadWord of the input, taken as a package or as a bare styles part, under
 // the Word schema. A read either fails with a message or gives a sheet whose
-// written styles part reads back into a sheet that writes the same part.
+// written styles part reads back into a sheet that writes the same part, as
+// canonical XML (raw and rebuilt elements may order their attributes apart).
 #include "FuzzCheck.h"
 
 #include <StylesWord/WordFile.h>
@@ -36,6 +37,6 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   const std::string written = Word::WriteStylesPart(sheet);
   StyleSheet again;
   FUZZ_CHECK(Word::ReadWord(written, again, report, limits));
-  FUZZ_CHECK(Word::WriteStylesPart(again) == written);
+  FUZZ_CHECK(Word::SameXml(Word::WriteStylesPart(again), written));
   return 0;
 }

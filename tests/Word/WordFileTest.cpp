@@ -236,7 +236,7 @@ TEST_F(WordFileTest, HostileFilesFailOrWarnClearly) {
     const std::string written = WriteStylesPart(sheet);
     StyleSheet again;
     EXPECT_TRUE(ReadWord(written, again, report)) << Describe(report);
-    EXPECT_EQ(WriteStylesPart(again), written);
+    EXPECT_TRUE(SameXml(WriteStylesPart(again), written));
   }
   EXPECT_GE(count, 10);
 }

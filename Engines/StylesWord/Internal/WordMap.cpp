@@ -563,14 +563,16 @@ bool SameShallow(const pugi::xml_node& a, const pugi::xml_node& b) {
   if (a.type() != b.type() || std::strcmp(a.name(), b.name()) != 0 ||
       std::strcmp(a.value(), b.value()) != 0)
     return false;
-  std::size_t count = 0;
-  for (const pugi::xml_attribute attribute : a.attributes()) {
-    const pugi::xml_attribute other = b.attribute(attribute.name());
-    if (!other || std::strcmp(attribute.value(), other.value()) != 0)
-      return false;
-    ++count;
-  }
-  return count == static_cast<std::size_t>(std::distance(b.attributes_begin(), b.attributes_end()));
+  // The attributes as sorted lists of names and values, whatever their order.
+  using Attributes = std::vector<std::pair<std::string_view, std::string_view>>;
+  const auto sorted = [](const pugi::xml_node& node) {
+    Attributes list;
+    for (const pugi::xml_attribute attribute : node.attributes())
+      list.emplace_back(attribute.name(), attribute.value());
+    std::sort(list.begin(), list.end());
+    return list;
+  };
+  return sorted(a) == sorted(b);
 }
 
 } // namespace

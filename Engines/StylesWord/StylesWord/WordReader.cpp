@@ -8,6 +8,7 @@
 #include <Styles/StyleManager.h>
 #include <Styles/StyleSheet.h>
 
+#include <algorithm>
 #include <cctype>
 #include <cstring>
 #include <functional>
@@ -46,6 +47,26 @@ bool ParseXml(std::string_view text, pugi::xml_document& document, std::string& 
       message = "has a DOCTYPE; document type declarations and entities are refused";
       return false;
     }
+  // The parser lets an attribute repeat; well-formed XML does not.
+  struct RepeatFinder : pugi::xml_tree_walker {
+    std::string repeated;
+    bool for_each(pugi::xml_node& node) override {
+      std::vector<std::string_view> names;
+      for (const pugi::xml_attribute attribute : node.attributes())
+        names.emplace_back(attribute.name());
+      std::sort(names.begin(), names.end());
+      const auto twice = std::adjacent_find(names.begin(), names.end());
+      if (twice == names.end())
+        return true;
+      repeated = std::string(node.name()) + " repeats the attribute " + std::string(*twice);
+      return false;
+    }
+  } finder;
+  document.traverse(finder);
+  if (!finder.repeated.empty()) {
+    message = "is not well-formed XML (" + finder.repeated + ")";
+    return false;
+  }
   return true;
 }
 

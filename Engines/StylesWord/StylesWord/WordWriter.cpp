@@ -10,6 +10,7 @@
 
 #include <algorithm>
 #include <cctype>
+#include <climits>
 #include <cstring>
 #include <map>
 #include <set>
@@ -107,10 +108,10 @@ void PartWriter::CollectItems(Container container, const Style& style, std::vect
   if (rawText && !rawText->IsEmpty())
     AppendRaw(Narrow(*rawText), holder);
   std::set<const detail::Group*> covered;
-  int rank = -1;
   for (const pugi::xml_node child : holder.children()) {
+    // Elements the order does not know (extensions) go last, as Word puts them.
     const int known = detail::ChildRank(container, child.name());
-    rank = known >= 0 ? known : rank;
+    const int rank = known >= 0 ? known : INT_MAX;
     const detail::Group* group = detail::FindGroup(container, child.name());
     if (group) {
       detail::Values values;
