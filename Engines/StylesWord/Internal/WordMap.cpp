@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <cmath>
 #include <cstring>
-#include <sstream>
 
 namespace Styles {
 namespace Word {
@@ -606,10 +605,21 @@ bool SameNode(const pugi::xml_node& a, const pugi::xml_node& b) {
   return true;
 }
 
+void AppendNodeText(const pugi::xml_node& node, std::string& out) {
+  struct Appender : pugi::xml_writer {
+    explicit Appender(std::string& text) : text(text) {}
+    void write(const void* data, std::size_t size) override {
+      text.append(static_cast<const char*>(data), size);
+    }
+    std::string& text;
+  } appender(out);
+  node.print(appender, "", pugi::format_raw);
+}
+
 std::string NodeText(const pugi::xml_node& node) {
-  std::ostringstream out;
-  node.print(out, "", pugi::format_raw);
-  return out.str();
+  std::string text;
+  AppendNodeText(node, text);
+  return text;
 }
 
 Text Widen(std::string_view text) { return Text(ZelPlatform::Utf8ToUtf16(text)); }

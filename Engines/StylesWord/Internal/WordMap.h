@@ -101,8 +101,9 @@ bool SameOwnValues(const Group& group, const Style& style, const Values& values)
 /// Whether two elements are equal as canonical XML: same names, the same
 /// attributes in any order, the same children and text.
 bool SameNode(const pugi::xml_node& a, const pugi::xml_node& b);
-/// The element as raw XML text.
+/// The element as raw XML text, returned or appended to `out`.
 std::string NodeText(const pugi::xml_node& node);
+void AppendNodeText(const pugi::xml_node& node, std::string& out);
 
 /// UTF-8 and UTF-16.
 Text Widen(std::string_view text);

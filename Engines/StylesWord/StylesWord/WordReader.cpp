@@ -139,6 +139,7 @@ private:
   std::map<std::u16string, int> m_nextNumber;
   bool m_quiet = false;
   std::string m_context; // the style being read, for warnings
+  pugi::xml_document m_scratch; // holds elements built to compare, one at a time
 };
 
 Style* PartReader::AddStyle(const Text& name, const PropertyKey& category,
@@ -166,7 +167,7 @@ void PartReader::ReadChildren(Container container, const pugi::xml_node& element
       continue;
     const detail::Group* group = detail::FindGroup(container, child.name());
     if (!group) {
-      raw += detail::NodeText(child);
+      detail::AppendNodeText(child, raw);
       continue;
     }
     detail::Values values;
@@ -180,10 +181,11 @@ void PartReader::ReadChildren(Container container, const pugi::xml_node& element
       style.SetProperty(key, std::move(value));
     // What the writer would make of the values must be the element itself;
     // where it is not (other spellings, extra attributes), the element is kept.
-    pugi::xml_document written;
+    pugi::xml_node written = m_scratch.append_child("written");
     detail::WriteGroup(*group, style, m_theme, written);
     if (!detail::SameNode(written.first_child(), child))
-      raw += detail::NodeText(child);
+      detail::AppendNodeText(child, raw);
+    m_scratch.remove_child(written);
   }
   AppendRaw(style, container, raw);
 }
