@@ -13,7 +13,8 @@ PREFIX         ?= /usr/local
 
 # Debian packages the build needs; the reference needs only its own, which
 # `make docs` (or `make deps DOCS=1`) installs.
-PACKAGES := cmake make g++ pkg-config rapidjson-dev libicu-dev libgtest-dev libbenchmark-dev libcli11-dev
+PACKAGES := cmake make g++ pkg-config rapidjson-dev libicu-dev libgtest-dev libbenchmark-dev libcli11-dev \
+            libpugixml-dev libzip-dev python3-docx
 DOCS_PACKAGES := doxygen
 # And those that fuzzing needs, installed only with FUZZ=1 (`make fuzz` asks).
 FUZZ_PACKAGES := clang libfuzzer-14-dev libclang-rt-14-dev
@@ -28,7 +29,7 @@ BROWSER_PACKAGES := chromium fonts-droid-fallback nodejs
 ifeq ($(BROWSER),1)
 PACKAGES += $(BROWSER_PACKAGES)
 endif
-FUZZ_TARGETS := FuzzJsonParse FuzzImport FuzzTextStream FuzzValidate FuzzNames
+FUZZ_TARGETS := FuzzJsonParse FuzzImport FuzzTextStream FuzzValidate FuzzNames FuzzWordRead
 
 # The project version, shown in the reference.
 VERSION := $(shell sed -n 's/^project.Styles VERSION \([0-9.]*\).*/\1/p' CMakeLists.txt)
@@ -119,7 +120,8 @@ fuzz:
 	cmake --build $(FUZZ_BUILD_DIR) -j $(JOBS)
 	@for t in $(FUZZ_TARGETS); do \
 	  mkdir -p $(FUZZ_BUILD_DIR)/corpus/$$t $(FUZZ_BUILD_DIR)/artifacts/$$t; \
-	  dict=""; case $$t in FuzzJsonParse|FuzzImport|FuzzValidate) dict="-dict=fuzz/json.dict";; esac; \
+	  dict=""; case $$t in FuzzJsonParse|FuzzImport|FuzzValidate) dict="-dict=fuzz/json.dict";; \
+	    FuzzWordRead) dict="-dict=fuzz/word.dict";; esac; \
 	  echo "== $$t for $(FUZZ_SECONDS) s"; \
 	  UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1 ASAN_OPTIONS=detect_leaks=1 \
 	  $(FUZZ_BUILD_DIR)/fuzz/$$t $(FUZZ_BUILD_DIR)/corpus/$$t fuzz/corpus/$$t $$dict \

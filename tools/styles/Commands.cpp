@@ -2,6 +2,7 @@
 
 #include "Graph.h"
 #include "Report.h"
+#include "WordDocuments.h"
 
 #include <StylesTools/Diff.h>
 #include <StylesTools/Schema.h>
@@ -55,9 +56,11 @@ bool ReadText(const std::string& path, Text& text) {
   return true;
 }
 
-// Reads `path` into `sheet` all or nothing; the warnings go to `warnings`.
-int LoadSheet(const std::string& path, StyleSheet& sheet,
-              std::vector<Diagnostic>* warnings = nullptr) {
+} // namespace
+
+int LoadSheet(const std::string& path, StyleSheet& sheet, std::vector<Diagnostic>* warnings) {
+  if (IsWordDocument(path))
+    return LoadWordSheet(path, sheet, warnings);
   Text text;
   if (!ReadText(path, text)) {
     Output::Error(DisplayName(path), "cannot be read");
@@ -73,9 +76,13 @@ int LoadSheet(const std::string& path, StyleSheet& sheet,
   return kSuccess;
 }
 
+namespace {
+
 // Reads from `path` only what the style `name` depends on, all or nothing:
 // a large document answers for one style at the cost of that style alone.
 int LoadStyle(const std::string& path, const std::string& name, StyleSheet& sheet) {
+  if (IsWordDocument(path))
+    return LoadWordSheet(path, sheet, nullptr);
   Text text;
   if (!ReadText(path, text)) {
     Output::Error(DisplayName(path), "cannot be read");
@@ -176,6 +183,11 @@ int Validate(const CommonOptions& options, const std::vector<std::string>& docum
   std::vector<FileDiagnostics> files;
   bool unreadable = false;
   for (const std::string& document : documents) {
+    std::vector<Diagnostic> word;
+    if (IsWordDocument(document) && WordDiagnostics(document, word)) {
+      files.push_back(FileDiagnostics{DisplayName(document), std::move(word)});
+      continue;
+    }
     Text text;
     if (!ReadText(document, text)) {
       Output::Error(DisplayName(document), "cannot be read");

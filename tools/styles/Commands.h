@@ -7,8 +7,14 @@
 
 #include "Output.h"
 
+#include <StylesTools/Diagnostics.h>
+
 #include <string>
 #include <vector>
+
+namespace Styles {
+class StyleSheet;
+} // namespace Styles
 
 namespace StylesCommand {
 
@@ -25,6 +31,11 @@ struct CommonOptions {
 bool RegisterSchemaFile(const std::string& path, int& status);
 // Takes out what RegisterSchemaFile registered, once no style is left.
 void DeregisterSchemaFile();
+
+// Reads the document `path` (JSON or Word) into `sheet` all or nothing; its
+// warnings go to `warnings`. kSuccess, or the status of the problem printed.
+int LoadSheet(const std::string& path, Styles::StyleSheet& sheet,
+              std::vector<Styles::Tools::Diagnostic>* warnings = nullptr);
 
 int Validate(const CommonOptions& options, const std::vector<std::string>& documents);
 int List(const CommonOptions& options, const std::string& document);

@@ -3,6 +3,7 @@
 // versions, and manages preset files. Commands take files or "-" for
 // standard input; see Commands.h for the exit statuses.
 #include "Commands.h"
+#include "WordDocuments.h"
 
 #include <CLI/CLI.hpp>
 
@@ -64,6 +65,12 @@ int main(int argc, char** argv) {
   report->add_option("--against", otherDocument, "Older document whose differences are marked");
   CLI::App* graph = app.add_subcommand("graph", "Print the inheritance graph as Graphviz DOT");
   graph->add_option("document", document, "Document, or -")->required();
+  std::string into, output = "-";
+  CLI::App* convert = app.add_subcommand(
+      "convert", "Convert between a JSON document and a Word file (a Word file gives JSON)");
+  convert->add_option("input", document, "Document or Word file, or -")->required();
+  convert->add_option("--into", into, "Write the styles into a copy of this Word package");
+  convert->add_option("-o,--output", output, "Output file (default: standard output)");
 
   CLI::App* preset = app.add_subcommand("preset", "Work on preset files in a folder");
   preset->require_subcommand(1);
@@ -83,8 +90,8 @@ int main(int argc, char** argv) {
   presetAdd->add_option("--name", name, "Preset name (default: the style's name)");
   presetAdd->add_flag("--replace", replace, "Replace a preset of that name");
 
-  for (CLI::App* command : {validate, list, show, flatten, diff, format, report, graph, presetList,
-                            presetShow, presetAdd, presetDelete})
+  for (CLI::App* command : {validate, list, show, flatten, diff, format, report, graph, convert,
+                            presetList, presetShow, presetAdd, presetDelete})
     AddCommonOptions(*command, options);
 
   try {
@@ -94,7 +101,11 @@ int main(int argc, char** argv) {
   }
 
   int status = kSuccess;
-  if (!RegisterSchemaFile(options.schema, status))
+  // Word files are read under the Word schema unless a schema is named.
+  std::vector<std::string> inputs = documents;
+  inputs.insert(inputs.end(), {document, otherDocument});
+  const bool word = options.schema.empty() && (convert->parsed() || AnyWordDocument(inputs));
+  if (word ? !RegisterWordSchema(status) : !RegisterSchemaFile(options.schema, status))
     return status;
   try {
     if (validate->parsed())
@@ -113,6 +124,8 @@ int main(int argc, char** argv) {
       status = Report(options, document, outputFile, otherDocument);
     else if (graph->parsed())
       status = Graph(options, document);
+    else if (convert->parsed())
+      status = Convert(options, document, into, output);
     else if (presetList->parsed())
       status = PresetList(options, folder, set);
     else if (presetShow->parsed())
@@ -127,6 +140,6 @@ int main(int argc, char** argv) {
     Output::Error("", std::string("cannot complete the command: ") + error.what());
     status = kUnusable;
   }
-  DeregisterSchemaFile();
+  word ? DeregisterWordSchema() : DeregisterSchemaFile();
   return status;
 }
