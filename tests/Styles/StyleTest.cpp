@@ -70,16 +70,12 @@ TEST_F(StyleTest, LookupFallsBackThroughParentsToTheDefaultObject) {
   // Own values are not part of the inherited lookup.
   leaf->SetProperty(size, Any(20.0));
   EXPECT_EQ(Number(leaf->GetInheritedProperty(size)), 14.0);
-  EXPECT_FALSE(leaf->GetOverrideProperty(indent, out));
   EXPECT_TRUE(leaf->GetOverrideProperty(size, out));
   EXPECT_EQ(Number(out), 20.0);
 
-  // Unregistered keys are never stored; one lookup form throws.
+  // Unregistered keys are never stored; looking one up throws.
   EXPECT_THROW(leaf->GetProperty(unregistered), std::exception);
-  EXPECT_FALSE(leaf->GetProperty(unregistered, out));
-  EXPECT_THROW(leaf->GetInheritedProperty(unregistered, out), std::exception);
   leaf->SetProperty(unregistered, Any(1.0));
-  leaf->SetProperty(unregistered, 2.0);
   EXPECT_EQ(leaf->GetProperties().size(), 1u);
   Style free; // no category
   free.SetProperty(size, 3.0);
@@ -104,7 +100,6 @@ TEST_F(StyleTest, SettingClearingAndSelfAssignmentDestroyOldValuesOnce) {
   EXPECT_FALSE(style.DoesOverrideProperty(count));
   style.SetProperty(count, Any(4.0));
   EXPECT_TRUE(style.ClearProperty(count));
-  EXPECT_FALSE(style.ClearProperty(count));
   EXPECT_EQ(counts.destroyed, 3);
 
   // Self-assignment changes and destroys nothing.
@@ -185,11 +180,6 @@ TEST_F(StyleTest, OwnerBasedInheritance) {
   pCorner->SetParent(cornerBase);
   EXPECT_EQ(Number(aCorner->GetProperty(radius)), 9.0);
 
-  // A plain value where the owner's parent should hold a substyle.
-  aBorder->SetOwner(a, size); // pretend the border hangs under "size"
-  p->SetProperty(size, Any(3.0));
-  EXPECT_THROW(aCorner->GetProperty(radius), std::bad_cast);
-  aBorder->SetOwner(a, borderKey);
   // Without a parent anywhere above, the default.
   a->SetParent(nullptr);
   EXPECT_EQ(&aCorner->GetProperty(radius), &Default(corner, radius));
@@ -208,14 +198,11 @@ TEST_F(StyleTest, PathsThroughSubstyles) {
   EXPECT_EQ(style->GetSubstyle(borderKey, true), nullptr); // the null default
   EXPECT_THROW(style->GetSubstyle(size, true), std::bad_cast);
   // Leaving the substyles, a path ends at the element categories' defaults.
-  EXPECT_THROW(style->GetPathProperty({}), std::exception);
   EXPECT_EQ(&style->GetPathProperty({borderKey, cornerKey, radius}), &Default(corner, radius));
   // Failing one level down still walks from the root's category, which does
   // not know "corner" and so never reaches the corner category.
   style->SetPathProperty({borderKey, width}, Any(2.0));
   EXPECT_THROW(style->GetPathProperty({borderKey, cornerKey, radius}), std::exception);
-  EXPECT_THROW(style->GetPathProperty({borderKey, unregistered}), std::exception);
-  EXPECT_FALSE(style->ClearPathProperty({}));
   EXPECT_FALSE(style->ClearPathProperty({cornerKey, radius}));
 
   // With nothing to inherit from, only a forced revert clears; the parent of
@@ -274,30 +261,26 @@ protected:
   Style *a, *b, *c;
 };
 
-TEST_F(StyleChainTest, DependencyQueries) {
-  const std::vector<Style*> onlyA{a}, onlyC{c};
+TEST_F(StyleChainTest, DependencyQueriesAndRemoval) {
+  const std::vector<Style*> onlyA{a};
   EXPECT_FALSE(c->HasDependency(Span(onlyA), true));
   EXPECT_TRUE(c->HasDependency(Span(onlyA), false));
-  EXPECT_TRUE(c->HasDependency(Span(onlyC), true)); // itself
   std::vector<Style*> sorted{a, b};
   std::sort(sorted.begin(), sorted.end(), std::less<>());
   const std::vector<Style*> reversed(sorted.rbegin(), sorted.rend());
   EXPECT_EQ(c->GetDependencies(Span(reversed), false), sorted);
   EXPECT_EQ(c->GetDependencies(Span(reversed), true), std::vector<Style*>{b});
   EXPECT_TRUE(c->HasParentalDependency(Span(onlyA)));
-  EXPECT_FALSE(c->HasParentalDependency(Span(onlyC)));
   // A substyle depends on its owner's parent.
   c->SetPathProperty({borderKey, width}, Any(1.0));
   EXPECT_TRUE(c->GetSubstyle(borderKey, false)->HasParentalDependency());
   EXPECT_FALSE(a->HasParentalDependency());
-}
 
-// Whatever goes, C keeps its effective values: the parent link skips the
-// removed styles and what they gave becomes C's own.
-TEST_F(StyleChainTest, RemovingDependenciesKeepsEffectiveValues) {
+  // Whatever goes, C keeps its effective values: the parent link skips the
+  // removed styles and what they gave becomes C's own.
   std::vector<Style*> manyWithB(20, Para()); // long, unsorted, foreign to the chain
   manyWithB[7] = b;
-  const std::vector<Style*> onlyA{a}, onlyB{b};
+  const std::vector<Style*> onlyB{b};
   struct Case {
     const char* label;
     std::function<void()> remove;
@@ -321,9 +304,6 @@ TEST_F(StyleChainTest, RemovingDependenciesKeepsEffectiveValues) {
     EXPECT_EQ(Number(c->GetProperty(size)), 2.0); // the nearest value wins
     EXPECT_EQ(Number(c->GetProperty(indent)), 7.0);
   }
-  c->SetParent(b);
-  c->RemapDependency({{b, nullptr}}); // a mapping to null is ignored
-  EXPECT_EQ(c->GetParent(), b);
 }
 
 TEST_F(StyleChainTest, MergeAndFlatten) {
@@ -360,9 +340,6 @@ TEST_F(StyleChainTest, OwnerFreeCopiesOfSubstyles) {
   Style* stranger = Para();
   stranger->CopySubstyleProperties(holder, borderKey);
   EXPECT_TRUE(stranger->GetSubstyle(borderKey, false)->DoesOverrideProperty(width));
-  // A source resolving to the null default clears the key.
-  stranger->CopySubstyleProperties(Para(), borderKey);
-  EXPECT_EQ(stranger->GetSubstyle(borderKey, false), nullptr);
 }
 
 // Nodes carry a counted mark, a child node and a list of item nodes.
@@ -410,38 +387,31 @@ TEST_F(StyleTreeTest, OwnerLinksSurviveEveryOperationThatMovesSubstyles) {
   sheet.SetVersion(1);
   JsonValue json;
   tree->Serialize(sheet, json, false);
-  // Each row edits a fresh copy of the tree, or replaces it.
-  const std::pair<const char*, std::function<void(std::unique_ptr<Style>&)>> cases[] = {
-      {"copy", [](auto&) {}},
-      {"move", [](auto& s) { s = std::make_unique<Style>(std::move(*s)); }},
-      {"swap",
-       [](auto& s) {
-         auto swapped = std::make_unique<Style>();
-         swapped->SwapData(*s);
-         s = std::move(swapped);
-       }},
-      {"merge into nothing",
-       [&](auto& s) {
-         s = std::make_unique<Style>(nullptr, node.Key());
-         s->MergeProperties(tree.get(), false);
-       }},
-      {"merge into own substyles", [&](auto& s) { s->MergeProperties(tree.get(), true); }},
-      {"merge parent",
-       [&](auto& s) {
-         s = std::make_unique<Style>(tree.get(), node.Key());
-         s->MergeParentProperties(tree.get());
-       }},
-      {"flatten", [](auto& s) { s->Flatten(); }},
-      {"flattened clone", [&](auto& s) { s = Own(tree->CreateFlattenedStyle()); }},
-      {"remove all dependencies", [](auto& s) { s->RemoveAllDependencies(); }},
-      {"JSON round trip",
-       [&](auto& s) { s = Own(Style::Deserialize(sheet, json.Get<Json::Object>(), node.Key())); }},
+  const auto copy = [&] { return std::make_unique<Style>(*tree); };
+  const auto read = [&] { return Style::Deserialize(sheet, json.Get<Json::Object>(), node.Key()); };
+  // Each row edits a copy of the tree or an empty style.
+  struct Case {
+    const char* label;
+    bool fromCopy;
+    std::function<void(Style&)> edit;
   };
-  for (const auto& [label, edit] : cases) {
-    SCOPED_TRACE(label);
+  for (const Case& c : {
+           Case{"copy", true, [](Style&) {}},
+           Case{"move", true, [](Style& s) { s = Style(std::move(s)); }},
+           Case{"swap", false, [&](Style& s) { s.SwapData(*copy()); }},
+           Case{"merge into nothing", false,
+                [&](Style& s) { s.MergeProperties(tree.get(), false); }},
+           Case{"merge parent", false, [&](Style& s) { s.MergeParentProperties(tree.get()); }},
+           Case{"flatten", true, [](Style& s) { s.Flatten(); }},
+           Case{"flattened clone", false,
+                [&](Style& s) { s = std::move(*Own(tree->CreateFlattenedStyle())); }},
+           Case{"remove all dependencies", true, [](Style& s) { s.RemoveAllDependencies(); }},
+           Case{"JSON round trip", false, [&](Style& s) { s = std::move(*Own(read())); }},
+       }) {
+    SCOPED_TRACE(c.label);
     const int live = counts.Live();
-    auto result = std::make_unique<Style>(*tree);
-    edit(result);
+    auto result = c.fromCopy ? copy() : std::make_unique<Style>(nullptr, node.Key());
+    c.edit(*result);
     EXPECT_EQ(CheckOwnerLinks(*result), 9);
     EXPECT_EQ(Number(Deep(*result, 5)->GetProperty(mark)), 5.0);
     EXPECT_EQ(counts.Live(), live + 10);
@@ -478,7 +448,6 @@ TEST_F(StyleTreeTest, OverriddenPathsRevertAndClear) {
     bool overrides;
   };
   for (const Case& c : {
-           Case{"empty path", style.get(), {}, false},
            Case{"five deep", style.get(), {child, child, child, child, child, mark}, true},
            Case{"inherited does not count", &onlyParent, {mark}, false},
            Case{"wildcard on values", style.get(), {child, any}, true},
@@ -512,28 +481,24 @@ TEST_F(StyleTreeTest, OverriddenPathsRevertAndClear) {
   EXPECT_EQ(counts.Live(), 10);
 }
 
-// Number properties with the flags a host may switch on; reads and
-// adjustments are logged.
-class FlaggedNumberProperty : public StyleProperty {
-public:
-  enum Flag { kTemporary, kDeprecated, kAdjusting };
-  FlaggedNumberProperty(Flag flag, std::vector<std::string>* log)
+// A number property that is temporary ('t'), deprecated ('d') or needs
+// adjusting after reads ('a'); it logs reads and adjustments.
+struct FlaggedNumberProperty : StyleProperty {
+  FlaggedNumberProperty(char flag, testing::Log* log)
       : StyleProperty(Any(0.0), new ZelPref::NumberConversionPolicy(), &testing::IsNumber),
-        m_flag(flag), m_log(log) {}
-  bool IsTemporary() const override { return m_flag == kTemporary; }
-  bool IsDeprecated() const override { return m_flag == kDeprecated; }
-  bool NeedAdjustementsForStyleIO() const override { return m_flag == kAdjusting; }
+        flag(flag), log(log) {}
+  bool IsTemporary() const override { return flag == 't'; }
+  bool IsDeprecated() const override { return flag == 'd'; }
+  bool NeedAdjustementsForStyleIO() const override { return flag == 'a'; }
   void AdjustAfterDeserialize(const StyleSheet&, Style* style) const override {
-    m_log->push_back("adjust " + std::to_string(Number(style->GetProperty(GetName()))));
+    log->push_back("adjust " + std::to_string(Number(style->GetProperty(GetName()))));
   }
   bool Deserialize(const StyleSheet& sheet, Style* style, const JsonValue& in) const override {
-    m_log->push_back("read " + std::string(GetName().GetView().begin(), GetName().GetView().end()));
+    log->push_back("read " + std::string(GetName().GetView().begin(), GetName().GetView().end()));
     return StyleProperty::Deserialize(sheet, style, in);
   }
-
-private:
-  Flag m_flag;
-  std::vector<std::string>* m_log;
+  char flag;
+  testing::Log* log;
 };
 
 Json::Object Parse(const char16_t* text) {
@@ -544,11 +509,10 @@ Json::Object Parse(const char16_t* text) {
 }
 
 TEST_F(StyleTest, JsonWritesFixedMembersFirstAndReadsDeprecatedLast) {
-  std::vector<std::string> log;
-  using Flagged = FlaggedNumberProperty;
-  const PropertyKey scratch = para.Add(u"scratch", new Flagged(Flagged::kTemporary, &log));
-  const PropertyKey oldSize = para.Add(u"oldSize", new Flagged(Flagged::kDeprecated, &log));
-  para.Add(u"adjusted", new Flagged(Flagged::kAdjusting, &log));
+  testing::Log log;
+  const PropertyKey scratch = para.Add(u"scratch", new FlaggedNumberProperty('t', &log));
+  const PropertyKey oldSize = para.Add(u"oldSize", new FlaggedNumberProperty('d', &log));
+  para.Add(u"adjusted", new FlaggedNumberProperty('a', &log));
   StyleSheet sheet;
   sheet.SetVersion(1); // the manager's initial version -1 is older than any property
   Style* x = new Style(nullptr, para.Key());
@@ -573,13 +537,10 @@ TEST_F(StyleTest, JsonWritesFixedMembersFirstAndReadsDeprecatedLast) {
   style = read(u"{\"inherits\":\"X\",\"id\":\"\",\"original\":7,\"nonsense\":\"1\","
                u"\"oldSize\":\"1\",\"adjusted\":\"5\",\"size\":\"2\"}");
   EXPECT_EQ(style->GetParent(), x);
-  EXPECT_TRUE(style->GetExternalID().IsEmpty());
-  EXPECT_TRUE(style->GetExternalName().IsEmpty());
+  EXPECT_TRUE(style->GetExternalID().IsEmpty() && style->GetExternalName().IsEmpty());
   EXPECT_EQ(style->GetProperties().size(), 3u);
   EXPECT_EQ(Number(style->GetProperty(oldSize)), 1.0);
   EXPECT_EQ(log, (std::vector<std::string>{"read adjusted", "read oldSize", "adjust 5.000000"}));
-  EXPECT_EQ(read(u"{\"inherits\":5}")->GetParent(), nullptr);
-  EXPECT_EQ(read(u"{\"inherits\":\"missing\"}")->GetParent(), nullptr);
   EXPECT_THROW(read(u"{\"size\":\"big\"}"), ZelPref::Detail::BadConversion);
 
   // Reading into a style of the sheet: never its own parent, never a cycle.
