@@ -280,7 +280,7 @@ TEST_F(StyleChainTest, DependencyQueriesAndRemoval) {
   // removed styles and what they gave becomes C's own.
   std::vector<Style*> manyWithB(20, Para()); // long, unsorted, foreign to the chain
   manyWithB[7] = b;
-  const std::vector<Style*> onlyB{b};
+  const std::vector<Style*> onlyB{b}, both{a, b};
   struct Case {
     const char* label;
     std::function<void()> remove;
@@ -290,6 +290,8 @@ TEST_F(StyleChainTest, DependencyQueriesAndRemoval) {
   for (const Case& row : {
            Case{"A is not C's parent", [&] { c->RemoveDependency(Span(onlyA), true); }, b, 0},
            Case{"the parent", [&] { c->RemoveDependency(Span(onlyB), true); }, a, 1},
+           Case{"parent and grandparent", [&] { c->RemoveDependency(Span(both), true); }, nullptr,
+                2},
            Case{"among many", [&] { c->RemoveDependency(Span(manyWithB), false); }, a, 1},
            Case{"an ancestor folds the chain", [&] { c->RemoveDependency(Span(onlyA), false); },
                 nullptr, 2},
