@@ -53,11 +53,10 @@ TEST_F(AtomicFileTest, WritesRegularFilesAndRefusesTheRest) {
     const char* reason; // null: written
     const char* holder; // the file that receives the bytes
   };
-  for (const Case& c : {Case{"new", nullptr, "new"}, Case{"old", nullptr, "old"},
-                        Case{"link", nullptr, "old"}, Case{"dangling", "missing", nullptr},
-                        Case{"sub", "not a regular file", nullptr},
-                        Case{"fifo", "not a regular file", nullptr},
-                        Case{"absent/x", "No such file", nullptr}}) {
+  for (const Case& c :
+       {Case{"new", nullptr, "new"}, Case{"old", nullptr, "old"}, Case{"link", nullptr, "old"},
+        Case{"dangling", "missing", nullptr}, Case{"sub", "not a regular file", nullptr},
+        Case{"fifo", "not a regular file", nullptr}, Case{"absent/x", "No such file", nullptr}}) {
     SCOPED_TRACE(c.name);
     SetUp();
     std::string error;
