@@ -2,6 +2,7 @@
 
 #include <Styles/StyleSheet.h>
 
+#include <SystemIO/AtomicFile.h>
 #include <SystemIO/FileSystem.h>
 #include <SystemIO/Path.h>
 #include <ZelUtils/Stream.h>
@@ -37,7 +38,11 @@ std::string UtcTimeStamp() {
 } // namespace
 
 FolderPresetManager::FolderPresetManager(ZelStringT<char16_t> folder)
-    : m_folder(std::move(folder)) {}
+    : m_folder(std::move(folder)) {
+  // What saves killed before finishing left behind goes at once.
+  if (!m_folder.IsEmpty())
+    SystemIO::RemoveStaleTemporaryFiles(ZelPlatform::Utf16ToUtf8(m_folder.GetView()));
+}
 
 FolderPresetManager::~FolderPresetManager() = default;
 

@@ -22,7 +22,8 @@ public:
   /// not load, as a damaged one.
   static constexpr std::size_t kMaxSetFileBytes = std::size_t{32} << 20;
 
-  /// Keeps the sets in `folder`, which must exist; nothing is read yet.
+  /// Keeps the sets in `folder`, which must exist; no set is read yet. Removes
+  /// the temporary files that saves killed before finishing left there.
   explicit FolderPresetManager(ZelStringT<char16_t> folder);
   ~FolderPresetManager() override;
 
