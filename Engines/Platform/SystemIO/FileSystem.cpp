@@ -92,11 +92,6 @@ bool File::ReadRegular(const ZelStringT<char16_t>& path, std::size_t maxBytes, s
   return true;
 }
 
-bool File::Remove(const ZelStringT<char16_t>& path) {
-  std::string nativePath;
-  return ZelPlatform::detail::ToNativePath(path, nativePath) && ::unlink(nativePath.c_str()) == 0;
-}
-
 std::vector<ZelStringT<char16_t>> Directory::GetFileNames(const ZelStringT<char16_t>& folder) {
   std::vector<ZelStringT<char16_t>> names;
   std::string nativeFolder;

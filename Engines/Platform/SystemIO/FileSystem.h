@@ -1,6 +1,6 @@
 /// @file
 /// SystemIO::File and SystemIO::Directory: the few file-system operations that
-/// preset folders need (guarded reading, moving a file aside, removing a file)
+/// preset folders need (guarded reading, moving a file aside)
 /// and the listing of a folder. Paths are UTF-16 text, as in SystemIO::Path.
 #pragma once
 
@@ -30,9 +30,6 @@ struct ZEL_API File {
   /// the file is missing, refused, too large or cannot be read.
   static bool ReadRegular(const ZelStringT<char16_t>& path, std::size_t maxBytes,
                           std::string& bytes, std::string* error = nullptr);
-  /// Removes the file `path` (a link itself, not what it points to). False
-  /// when there is no such file, it is a folder, or it cannot be removed.
-  static bool Remove(const ZelStringT<char16_t>& path);
 };
 
 /// Operations on folders.
