@@ -74,7 +74,7 @@ bench: deps
 	cmake --build $(BENCH_BUILD_DIR) -j $(JOBS)
 	for b in $(BENCH_BUILD_DIR)/benchmarks/Benchmark*; do [ -x "$$b" ] && "$$b" || exit 1; done
 
-# Builds the libFuzzer targets with clang, ASan and UBSan at -O2, and runs each
+# Builds the libFuzzer targets with clang, ASan and UBSan at -O1, and runs each
 # for FUZZ_SECONDS on a copy of its seed corpus; the document targets take
 # inputs up to 64 KB, and their seeds hold one document of each size class. A crash, leak, sanitizer report,
 # unit slower than 2 s or memory beyond 2 GB fails it; libFuzzer keeps the
