@@ -1,5 +1,8 @@
 #include "Commands.h"
 
+#include "Graph.h"
+#include "Report.h"
+
 #include <StylesTools/Diff.h>
 #include <StylesTools/Schema.h>
 
@@ -32,6 +35,11 @@ Styles::Tools::SchemaRegistration& Registration() {
 }
 
 std::string DisplayName(const std::string& path) { return path == "-" ? "<stdin>" : path; }
+
+// A document's file name without its folder, to title a page or graph.
+std::string TitleOf(const std::string& path) {
+  return std::filesystem::path(DisplayName(path)).filename().string();
+}
 
 // The whole of a file, or of standard input for "-", decoded from UTF-8.
 bool ReadText(const std::string& path, Text& text) {
@@ -274,6 +282,27 @@ int Format(const CommonOptions&, const std::string& document, bool compact) {
   Json::Value value{Json::Object()};
   sheet.ExportJson(value, true);
   Output(true).Document(Json::ValueToString(value, !compact));
+  return kSuccess;
+}
+
+int Report(const CommonOptions&, const std::string& document, const std::string& output,
+           const std::string& against) {
+  StyleSheet sheet, oldSheet;
+  if (const int status = LoadSheet(document, sheet))
+    return status;
+  if (!against.empty())
+    if (const int status = LoadSheet(against, oldSheet))
+      return status;
+  return WriteOutput(BuildReport(sheet, TitleOf(document), against.empty() ? nullptr : &oldSheet,
+                                 TitleOf(against)),
+                     output);
+}
+
+int Graph(const CommonOptions&, const std::string& document) {
+  StyleSheet sheet;
+  if (const int status = LoadSheet(document, sheet))
+    return status;
+  WriteDot(sheet, TitleOf(document), std::cout);
   return kSuccess;
 }
 

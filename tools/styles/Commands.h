@@ -34,6 +34,12 @@ int Flatten(const CommonOptions& options, const std::string& document, const std
 int Diff(const CommonOptions& options, const std::string& oldDocument,
          const std::string& newDocument, bool effective);
 int Format(const CommonOptions& options, const std::string& document, bool compact);
+// The HTML report of `document` to `output` (standard output when empty),
+// marking what changed since `against` when it is not empty.
+int Report(const CommonOptions& options, const std::string& document, const std::string& output,
+           const std::string& against);
+// The inheritance graph of `document` as Graphviz DOT.
+int Graph(const CommonOptions& options, const std::string& document);
 
 int PresetList(const CommonOptions& options, const std::string& folder, const std::string& set);
 int PresetShow(const CommonOptions& options, const std::string& folder, const std::string& set,

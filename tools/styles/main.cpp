@@ -35,7 +35,7 @@ int main(int argc, char** argv) {
 
   CommonOptions options;
   std::vector<std::string> documents;
-  std::string document, otherDocument, style, folder, set, name;
+  std::string document, otherDocument, style, folder, set, name, outputFile;
   bool explain = false, effective = false, compact = false, replace = false;
 
   CLI::App* validate = app.add_subcommand("validate", "List every problem of documents");
@@ -57,6 +57,14 @@ int main(int argc, char** argv) {
   format->add_option("document", document, "Document, or -")->required();
   format->add_flag("--compact", compact, "One line instead of indented text");
 
+  CLI::App* report =
+      app.add_subcommand("report", "Write an HTML page of the inheritance graphs and values");
+  report->add_option("document", document, "Document, or -")->required();
+  report->add_option("-o,--output", outputFile, "HTML file to write (default: standard output)");
+  report->add_option("--against", otherDocument, "Older document whose differences are marked");
+  CLI::App* graph = app.add_subcommand("graph", "Print the inheritance graph as Graphviz DOT");
+  graph->add_option("document", document, "Document, or -")->required();
+
   CLI::App* preset = app.add_subcommand("preset", "Work on preset files in a folder");
   preset->require_subcommand(1);
   CLI::App* presetList = preset->add_subcommand("list", "List the sets, or the presets of SET");
@@ -77,8 +85,8 @@ int main(int argc, char** argv) {
   presetAdd->add_option("--name", name, "Preset name (default: the style's name)");
   presetAdd->add_flag("--replace", replace, "Replace a preset of that name");
 
-  for (CLI::App* command : {validate, list, show, flatten, diff, format, presetList, presetShow,
-                            presetAdd, presetDelete, presetRecover})
+  for (CLI::App* command : {validate, list, show, flatten, diff, format, report, graph, presetList,
+                            presetShow, presetAdd, presetDelete, presetRecover})
     AddCommonOptions(*command, options);
 
   try {
@@ -103,6 +111,10 @@ int main(int argc, char** argv) {
       status = Diff(options, document, otherDocument, effective);
     else if (format->parsed())
       status = Format(options, document, compact);
+    else if (report->parsed())
+      status = Report(options, document, outputFile, otherDocument);
+    else if (graph->parsed())
+      status = Graph(options, document);
     else if (presetList->parsed())
       status = PresetList(options, folder, set);
     else if (presetShow->parsed())

@@ -95,16 +95,4 @@ TEST_F(StreamTest, BadPathsGiveUnusableStreams) {
   EXPECT_EQ(MemoryStream::GetBytes(unusable), "");
 }
 
-TEST_F(StreamTest, MemoryStreamsShareBytesAndPosition) {
-  Stream stream = MemoryStream::FromBytes("abcdef");
-  Stream copy = stream;
-  char buffer[4] = {};
-  EXPECT_EQ(stream.Read(buffer, 2), 2u);
-  EXPECT_EQ(copy.Read(buffer, 4), 4u); // continues where the other handle stopped
-  EXPECT_EQ(std::string(buffer, 4), "cdef");
-  EXPECT_TRUE(stream.Write("gh", 2));
-  EXPECT_EQ(MemoryStream::GetBytes(copy), "abcdefgh");
-  EXPECT_EQ(ReadAll(copy), "gh");
-}
-
 } // namespace
