@@ -1,5 +1,6 @@
 #include <StylesTools/Diagnostics.h>
 
+#include <Internal/MemberPositions.h>
 #include <Internal/ToolsSupport.h>
 
 #include <Styles/Internal/DocumentVersion.h>
@@ -43,22 +44,6 @@ constexpr std::size_t kNone = ~std::size_t(0);
 // The names whose unreadable values a plain import replaces instead of failing.
 bool IsRepairedName(const Text& name) {
   return name == u"xScale" || name == u"yScale" || name == u"angle" || name == u"skew";
-}
-
-// Line and column (from 1) of a UTF-16 offset, columns in characters.
-std::pair<int, int> LineAndColumn(const Text& text, std::size_t offset) {
-  int line = 1, column = 1;
-  const std::size_t end = std::min(offset, text.GetLength());
-  for (std::size_t i = 0; i < end; ++i) {
-    const char16_t c = text[i];
-    if (c == u'\n') {
-      ++line;
-      column = 1;
-    } else if (c < 0xDC00 || c > 0xDFFF || i == 0 || text[i - 1] < 0xD800 || text[i - 1] > 0xDBFF) {
-      ++column; // the second half of a surrogate pair is not a character of its own
-    }
-  }
-  return {line, column};
 }
 
 // The offset the parser's message ends with ("... at offset N"), if any.
@@ -108,7 +93,17 @@ public:
       : m_manager(GetStyleManager()), m_target(target), m_replace(replace) {}
 
   std::vector<Diagnostic> Run(const Json::Object& document) {
+    for (const char16_t* name : {kVersion, kExternalID})
+      if (m_manager.CategoryExists(name))
+        Add(Severity::Error, "reserved-name", Text(u"/") + name,
+            u"the registered category " + Quoted(name) +
+                u" has the name of a document's own member; its styles cannot be written");
+    CheckRepeatedNames(document, nullptr);
     CollectStyles(document);
+    if (!m_understood && !document.IsEmpty())
+      Add(Severity::Error, "nothing-read", Text(),
+          u"no member of the document is a registered category, the version or the id; "
+          u"nothing would be read");
     const int current = m_manager.GetCurrentVersion();
     if (m_versionSeen && current >= 0 && m_documentVersion > current)
       Add(Severity::Warning, "version-too-new", u"/version",
@@ -168,7 +163,9 @@ private:
             u"category " + Quoted(name) + u" is not registered; its styles are skipped");
         continue;
       }
+      m_understood = true;
       const PropertyKey categoryKey(name);
+      CheckReservedProperties(categoryKey, where);
       m_styles.reserve(m_styles.size() + category->GetSize());
       m_nodes.reserve(m_nodes.size() + category->GetSize());
       for (std::size_t j = 0; j < category->GetSize(); ++j) {
@@ -186,8 +183,50 @@ private:
     }
   }
 
+  // Reports each name that `object` holds more than once; the reading keeps
+  // only one of the values. Style names of a category are checked by AddName.
+  void CheckRepeatedNames(const Json::Object& object, const Where* where) {
+    const std::size_t size = object.GetSize();
+    if (size < 2)
+      return;
+    const auto report = [&](std::size_t i) {
+      const Text& name = object.GetValueName(i);
+      Add(Severity::Error, "duplicate-member", Where{where, &name},
+          u"member " + Quoted(name) + u" appears more than once; only one of its values is read");
+    };
+    if (size <= 16) { // most styles: no set to build
+      for (std::size_t i = 1; i < size; ++i)
+        for (std::size_t j = 0; j < i; ++j)
+          if (object.GetValueName(i) == object.GetValueName(j)) {
+            report(i);
+            break;
+          }
+      return;
+    }
+    std::unordered_set<std::u16string_view> seen;
+    for (std::size_t i = 0; i < size; ++i)
+      if (!seen.insert(object.GetValueName(i).GetView()).second)
+        report(i);
+  }
+
+  // A property whose key is a style's own member can be neither read nor
+  // written apart from that member; reported once per category.
+  void CheckReservedProperties(const PropertyKey& categoryKey, const Where& where) {
+    const std::shared_ptr<StyleCategory>* category = m_manager.FindCategory(categoryKey);
+    if (!category || !m_reservedChecked.insert(categoryKey.GetString().GetView()).second)
+      return;
+    for (const char16_t* name : {kInherits, kExternalID, kExternalName}) {
+      const std::optional<PropertyKey> key = PropertyKey::Find(name);
+      if (key && (*category)->GetStyleProperty(*key))
+        Add(Severity::Error, "reserved-name", where,
+            u"category " + Quoted(categoryKey.GetString()) + u" registers a property " +
+                Quoted(name) + u", the name of a style's own member");
+    }
+  }
+
   void CheckSheetMember(const Text& name, const Json::Value& value, const Where& where) {
     if (name == kVersion) {
+      m_understood = true;
       if (const double* number = value.GetIf<double>()) {
         m_documentVersion = Styles::detail::TruncateVersion(*number);
         m_versionSeen = true;
@@ -195,6 +234,7 @@ private:
         Add(Severity::Error, "wrong-kind", where, u"the version must be a number");
       }
     } else if (name == kExternalID) {
+      m_understood = true;
       if (!value.Is<Text>())
         Add(Severity::Error, "wrong-kind", where, u"the sheet's id must be a string");
     } else {
@@ -261,6 +301,7 @@ private:
               u" is not registered; the substyle is read empty");
       return;
     }
+    CheckRepeatedNames(object, &where);
     for (std::size_t i = 0; i < object.GetSize(); ++i) {
       const Text& name = object.GetValueName(i);
       const Json::Value& value = object.GetValue(i);
@@ -426,6 +467,8 @@ private:
   bool m_replace;
   int m_documentVersion = 0;
   bool m_versionSeen = false;
+  bool m_understood = false; // some member is a registered category, the version or the id
+  std::unordered_set<std::u16string_view> m_reservedChecked;
   std::vector<DocumentStyle> m_styles;
   std::size_t m_current = kNone; // the document style being checked
   std::vector<Node> m_nodes;
@@ -442,7 +485,7 @@ Json::Object* ParseDocument(const Text& text, Json::Value& value,
     Diagnostic diagnostic{Severity::Error, "invalid-json", Text(), u"not JSON: " + errorText, 0, 0};
     std::size_t offset = 0;
     if (ParseErrorOffset(errorText, offset))
-      std::tie(diagnostic.line, diagnostic.column) = LineAndColumn(text, offset);
+      std::tie(diagnostic.line, diagnostic.column) = detail::LinesAndColumns(text, {offset})[0];
     diagnostics.push_back(std::move(diagnostic));
     return nullptr;
   }
@@ -470,8 +513,10 @@ bool HasErrors(const std::vector<Diagnostic>& diagnostics) {
 std::vector<Diagnostic> ValidateDocument(const Text& text) {
   std::vector<Diagnostic> diagnostics;
   Json::Value value;
-  if (const Json::Object* document = ParseDocument(text, value, diagnostics))
-    return ValidateDocument(*document);
+  if (const Json::Object* document = ParseDocument(text, value, diagnostics)) {
+    diagnostics = ValidateDocument(*document);
+    detail::LocateMembers(text, diagnostics);
+  }
   return diagnostics;
 }
 
@@ -484,8 +529,12 @@ bool ImportChecked(StyleSheet& target, const Text& text, bool replace,
                    std::vector<Diagnostic>* diagnostics) {
   std::vector<Diagnostic> found;
   Json::Value value;
-  if (Json::Object* document = ParseDocument(text, value, found))
-    return ImportChecked(target, *document, replace, diagnostics);
+  if (Json::Object* document = ParseDocument(text, value, found)) {
+    const bool imported = ImportChecked(target, *document, replace, diagnostics);
+    if (diagnostics)
+      detail::LocateMembers(text, *diagnostics);
+    return imported;
+  }
   if (diagnostics)
     *diagnostics = std::move(found);
   return false;

@@ -30,7 +30,8 @@ enum class Severity { Error, Warning };
 /// Codes, stable across versions (tools match on them):
 /// - errors:   invalid-json, not-an-object, style-not-object, wrong-kind,
 ///             bad-value, type-rejected, missing-parent, inheritance-cycle,
-///             parent-category, duplicate-name, behaviour-failed
+///             parent-category, duplicate-name, duplicate-member,
+///             reserved-name, nothing-read, behaviour-failed
 /// - warnings: unknown-category, unknown-property, unknown-member,
 ///             value-replaced, number-rounded, version-too-new,
 ///             property-too-new, deprecated-property, name-taken
@@ -45,7 +46,9 @@ struct STYLES_TOOLS_API Diagnostic {
   ZelStringT<char16_t> message;
   ///@{
 
-  /// Line and column (from 1, in characters) of text that is not JSON; else 0.
+  /// Line and column (from 1, in characters) where the text stops being JSON,
+  /// or where the member the pointer names starts, when the diagnostic came
+  /// from checking text; else 0.
   int line = 0;
   int column = 0;
   ///@}
