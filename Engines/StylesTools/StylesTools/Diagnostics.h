@@ -70,6 +70,13 @@ STYLES_TOOLS_API std::vector<Diagnostic> ValidateDocument(const Json::Object& do
                                                           const StyleSheet* target = nullptr,
                                                           bool replace = false);
 
+/// Gives each of `diagnostics` that names a member of the JSON text `text` and
+/// has no line yet the line and column where that member starts (ValidateDocument
+/// and ImportChecked on text do this themselves). A diagnostic that reports a
+/// repeated name points at the repetition.
+STYLES_TOOLS_API void LocateDiagnostics(const ZelStringT<char16_t>& text,
+                                        std::vector<Diagnostic>& diagnostics);
+
 /// Imports `text` into `target` all or nothing. The document is validated
 /// against the target first; then it is imported into a scratch sheet that
 /// stands in for the target (empty stand-ins of the target's styles under
