@@ -1,13 +1,11 @@
 #include <ZelUtils/Stream.h>
 
 #include <Internal/NativePath.h>
-#include <SystemIO/Path.h>
 
 #include <algorithm>
 #include <cerrno>
 #include <cstdint>
 #include <cstring>
-#include <random>
 #include <utility>
 
 #include <fcntl.h>
@@ -74,14 +72,6 @@ public:
 
   // Writes go straight to the file; nothing is buffered here.
   bool Flush() override { return true; }
-  // Waits until the written bytes are on the storage device.
-  bool SyncToDisk() noexcept {
-    int result;
-    do {
-      result = ::fsync(m_descriptor);
-    } while (result != 0 && errno == EINTR);
-    return result == 0;
-  }
   bool IsReadable() const noexcept override { return !m_writable; }
   bool IsWritable() const noexcept override { return m_writable; }
 
@@ -121,18 +111,6 @@ Stream OpenFile(const ZelStringT<char16_t>& path, bool forWriting) {
                     forWriting ? O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC : O_RDONLY | O_CLOEXEC);
 }
 
-// A hidden name that no other file in the folder is likely to have.
-std::u16string TemporaryName(std::random_device& random) {
-  static constexpr char16_t kDigits[] = u"0123456789abcdef";
-  std::u16string name = u".tmp-";
-  for (int i = 0; i < 4; ++i) {
-    unsigned bits = random();
-    for (int j = 0; j < 4; ++j, bits >>= 4)
-      name.push_back(kDigits[bits & 0xF]);
-  }
-  return name;
-}
-
 class MemoryImpl final : public Stream::Impl {
 public:
   explicit MemoryImpl(std::string bytes) noexcept : m_bytes(std::move(bytes)) {}
@@ -163,39 +141,6 @@ private:
 Stream FileStream::Create(const ZelStringT<char16_t>& path) { return OpenFile(path, true); }
 
 Stream FileStream::Open(const ZelStringT<char16_t>& path) { return OpenFile(path, false); }
-
-Stream FileStream::CreateTemporary(const ZelStringT<char16_t>& folder, ZelStringT<char16_t>& path) {
-  path = ZelStringT<char16_t>();
-  if (folder.IsEmpty())
-    return Stream();
-  std::random_device random;
-  for (int attempt = 0; attempt < 100; ++attempt) {
-    ZelStringT<char16_t> candidate = SystemIO::Path::Combine(folder, TemporaryName(random));
-    std::string nativePath;
-    if (!ZelPlatform::detail::ToNativePath(candidate, nativePath))
-      return Stream();
-    // O_EXCL never reuses a file, nor follows a link planted under the name.
-    Stream stream;
-    try {
-      stream = OpenNative(nativePath, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC);
-    } catch (...) {
-      ::unlink(nativePath.c_str()); // the file was made by this call
-      throw;
-    }
-    if (stream) {
-      path = std::move(candidate);
-      return stream;
-    }
-    if (errno != EEXIST)
-      return Stream();
-  }
-  return Stream();
-}
-
-bool FileStream::SyncToDisk(const Stream& stream) {
-  auto* file = dynamic_cast<FileImpl*>(stream.GetImpl());
-  return file && file->IsWritable() && file->SyncToDisk();
-}
 
 Stream MemoryStream::Create() { return Stream(std::make_shared<MemoryImpl>(std::string())); }
 

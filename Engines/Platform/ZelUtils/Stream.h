@@ -73,15 +73,6 @@ struct ZEL_API FileStream {
   /// Opens an existing file for reading; the stream tests false when the file
   /// is missing, is a folder or cannot be read.
   static Stream Open(const ZelStringT<char16_t>& path);
-  /// Creates a new, empty file with a unique hidden name (".tmp-" and
-  /// hexadecimal digits) inside `folder` and opens it for writing; `path`
-  /// receives its path. Nothing existing is opened or replaced. The stream
-  /// tests false, and `path` is empty, when no file can be made there.
-  static Stream CreateTemporary(const ZelStringT<char16_t>& folder, ZelStringT<char16_t>& path);
-  /// Waits until every byte written to `stream` is on the storage device, so
-  /// that it survives a crash of the process or the system. False for a stream
-  /// that is not a file opened for writing, or when the device reports failure.
-  static bool SyncToDisk(const Stream& stream);
 };
 
 /// Streams that keep their bytes in memory.

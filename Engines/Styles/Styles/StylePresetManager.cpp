@@ -3,11 +3,12 @@
 #include <Styles/Style.h>
 #include <Styles/StyleSheet.h>
 
-#include <SystemIO/FileSystem.h>
+#include <SystemIO/AtomicFile.h>
 #include <SystemIO/Path.h>
 #include <ZelUtils/Stream.h>
 
 #include <memory>
+#include <string>
 #include <utility>
 
 namespace Styles {
@@ -15,43 +16,6 @@ namespace Styles {
 namespace {
 
 constexpr char16_t k_strPresetFileExtension[] = u".qsty";
-
-// A file written beside its final place and moved over it only when
-// complete; removed when it is never committed, exceptions included.
-class TemporaryFile {
-public:
-  explicit TemporaryFile(const ZelStringT<char16_t>& folder)
-      : m_stream(ZelUtils::FileStream::CreateTemporary(folder, m_path)) {}
-  ~TemporaryFile() {
-    m_stream = ZelUtils::Stream();
-    if (m_path.IsEmpty())
-      return;
-    try {
-      SystemIO::File::Remove(m_path);
-    } catch (...) {
-      // Out of memory for the path: a stray temporary file beats a crash.
-    }
-  }
-  TemporaryFile(const TemporaryFile&) = delete;
-  TemporaryFile& operator=(const TemporaryFile&) = delete;
-
-  ZelUtils::Stream& GetStream() noexcept { return m_stream; }
-
-  // Puts the written bytes on disk and the file in place of `target`.
-  bool Commit(const ZelStringT<char16_t>& target) {
-    if (!ZelUtils::FileStream::SyncToDisk(m_stream))
-      return false;
-    m_stream = ZelUtils::Stream();
-    if (!SystemIO::File::Replace(m_path, target))
-      return false;
-    m_path = ZelStringT<char16_t>();
-    return true;
-  }
-
-private:
-  ZelStringT<char16_t> m_path;
-  ZelUtils::Stream m_stream;
-};
 
 // Makes every other style of `sheet` drop its references to `style`, keeping
 // their effective values, so that `style` can be destroyed. Presets made here
@@ -88,19 +52,34 @@ ZelStringT<char16_t> StylePresetManager::GetFileName(const SetName& setName) con
 }
 
 bool StylePresetManager::Save(const SetName& setName) const {
+  m_lastSaveError = "the set name cannot name a file";
   if (!IsValidSetName(setName))
     return false;
-  const ZelStringT<char16_t> folder = GetPresetFolder();
-  TemporaryFile file(folder);
+  const ZelStringT<char16_t> path =
+      SystemIO::Path::Combine(GetPresetFolder(), GetFileName(setName));
+  const std::string nativePath = ZelPlatform::Utf16ToUtf8(path.GetView());
+  if (ZelPlatform::Utf8ToUtf16(nativePath) != path.GetView())
+    return false; // unpaired surrogates
+  SystemIO::AtomicFile file;
   // Deliberately, a file that cannot be created counts as success: only a
-  // failed write reports false.
-  if (!file.GetStream())
+  // failed write reports false. The reason stays for those who ask.
+  if (!file.Open(nativePath, &m_lastSaveError))
     return true;
+  m_lastSaveError = "the save was interrupted";
   // Without a sheet the empty file still replaces the set's file.
-  const StyleSheet* sheet = GetPresetStyleSheet(setName);
-  if (sheet && !sheet->Export(file.GetStream()))
+  std::string bytes;
+  if (const StyleSheet* sheet = GetPresetStyleSheet(setName)) {
+    ZelUtils::Stream stream = ZelUtils::MemoryStream::Create();
+    if (!sheet->Export(stream)) {
+      m_lastSaveError = "the set cannot be written as a document";
+      return false;
+    }
+    bytes = ZelUtils::MemoryStream::GetBytes(stream);
+  }
+  if (!file.Write(bytes, &m_lastSaveError) || !file.Commit(&m_lastSaveError))
     return false;
-  return file.Commit(SystemIO::Path::Combine(folder, GetFileName(setName)));
+  m_lastSaveError.clear();
+  return true;
 }
 
 std::vector<ZelStringT<char16_t>> StylePresetManager::GetPresetNames(const SetName& setName) const {

@@ -11,6 +11,7 @@
 #include <ZelPlatform/ZelString.h>
 
 #include <map>
+#include <string>
 #include <vector>
 
 namespace Styles {
@@ -94,6 +95,9 @@ protected:
   /// The loaded sets, owned by the manager; only derived classes insert. A
   /// null entry is allowed. Mutable so that a const lookup can load a set.
   mutable std::map<SetName, StyleSheet*> m_sheets;
+  /// Why the last Save left the set's file as it was (strerror-style text),
+  /// also when Save reported success; empty after a save that wrote it.
+  mutable std::string m_lastSaveError;
 };
 
 } // namespace Styles

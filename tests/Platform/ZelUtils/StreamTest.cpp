@@ -95,25 +95,6 @@ TEST_F(StreamTest, BadPathsGiveUnusableStreams) {
   EXPECT_EQ(MemoryStream::GetBytes(unusable), "");
 }
 
-// Temporary files are new hidden files of the folder; only file streams
-// opened for writing can be synced.
-TEST_F(StreamTest, TemporaryFilesAndSync) {
-  Text first, second;
-  Stream stream = FileStream::CreateTemporary(PathOf(u""), first);
-  ASSERT_TRUE(FileStream::CreateTemporary(PathOf(u""), second));
-  EXPECT_NE(first, second);
-  EXPECT_EQ(first.GetView().substr(0, PathOf(u".tmp-").GetLength()), PathOf(u".tmp-"));
-  EXPECT_TRUE(stream.Write("abc", 3) && FileStream::SyncToDisk(stream));
-  EXPECT_EQ(ReadAll(FileStream::Open(first)), "abc");
-  EXPECT_FALSE(FileStream::SyncToDisk(FileStream::Open(first)) ||
-               FileStream::SyncToDisk(MemoryStream::Create()) || FileStream::SyncToDisk(Stream()));
-  for (const Text& folder : {Text(), PathOf(u"missing"), first}) {
-    Text path = u"stale";
-    EXPECT_FALSE(FileStream::CreateTemporary(folder, path));
-    EXPECT_EQ(path, Text());
-  }
-}
-
 TEST_F(StreamTest, MemoryStreamsShareBytesAndPosition) {
   Stream stream = MemoryStream::FromBytes("abcdef");
   Stream copy = stream;
