@@ -1,20 +1,27 @@
 #include "Commands.h"
 
+#include "Input.h"
+
 #include <StylesTools/Diff.h>
 #include <StylesTools/Schema.h>
 
 #include <Styles/FolderPresetManager.h>
 #include <Styles/StyleSheet.h>
 
+#include <StylesTools/Rewrite.h>
+
 #include <Json/Json.h>
+#include <SystemIO/AtomicFile.h>
 #include <SystemIO/Path.h>
 #include <ZelUtils/Stream.h>
 #include <ZelUtils/TextStream.h>
 
+#include <algorithm>
 #include <filesystem>
 #include <iostream>
 #include <iterator>
 #include <memory>
+#include <optional>
 #include <system_error>
 
 namespace StylesCommand {
@@ -22,6 +29,7 @@ namespace StylesCommand {
 using Styles::Style;
 using Styles::StyleSheet;
 using Styles::Tools::Diagnostic;
+using Styles::Tools::Severity;
 
 namespace {
 
@@ -32,61 +40,98 @@ Styles::Tools::SchemaRegistration& Registration() {
 
 std::string DisplayName(const std::string& path) { return path == "-" ? "<stdin>" : path; }
 
-// The whole of a file, or of standard input for "-", decoded from UTF-8.
+// How a command takes what reading a document cannot keep: a read-only one
+// ignores it, a rewriting one refuses it or (with --lossy) warns.
+enum class Loss { Ignore, Refuse, Accept };
+
+// The text of `path` for the preset commands; false when it cannot be read.
 bool ReadText(const std::string& path, Text& text) {
-  ZelUtils::Stream stream;
-  if (path == "-") {
-    std::string bytes{std::istreambuf_iterator<char>(std::cin), std::istreambuf_iterator<char>()};
-    stream = ZelUtils::MemoryStream::FromBytes(std::move(bytes));
-  } else {
-    stream = ZelUtils::FileStream::Open(FromUtf8(path));
-    if (!stream)
-      return false;
-  }
-  text = ZelUtils::TextStreamReader(stream, ZelUtils::TextStream::UTF8).ReadToEnd();
+  std::string bytes, reason;
+  if (!ReadBytes(path, bytes, reason))
+    return false;
+  text = DecodeUtf8(std::move(bytes));
   return true;
 }
 
-// Reads `path` into `sheet` all or nothing; the warnings go to `warnings`.
-int LoadSheet(const std::string& path, StyleSheet& sheet,
-              std::vector<Diagnostic>* warnings = nullptr) {
-  Text text;
-  if (!ReadText(path, text)) {
-    Output::Error(DisplayName(path), "cannot be read");
+// Reads a document's text; `diagnostics` gets an error for bytes that are not
+// UTF-8 (they are read as U+FFFD).
+int ReadDocument(const std::string& path, Text& text, std::vector<Diagnostic>& diagnostics) {
+  std::string bytes, reason;
+  if (!ReadBytes(path, bytes, reason)) {
+    Output::Error(DisplayName(path), "cannot be read: " + reason);
     return kUnreadable;
   }
-  std::vector<Diagnostic> diagnostics;
-  if (!Styles::Tools::ImportChecked(sheet, text, true, &diagnostics)) {
+  if (std::optional<Diagnostic> invalid = FindInvalidUtf8(bytes))
+    diagnostics.push_back(std::move(*invalid));
+  text = DecodeUtf8(std::move(bytes));
+  return kSuccess;
+}
+
+// Whether a command goes on after reading a document into a sheet, given the
+// diagnostics of the reading. Text that is not UTF-8 stops every command; what
+// a rewrite would lose stops a rewriting one, unless the loss is accepted.
+int Conclude(const std::string& path, std::vector<Diagnostic> diagnostics, bool imported,
+             Loss loss) {
+  const auto isEncoding = [](const Diagnostic& d) { return d.code == "invalid-utf8"; };
+  const bool badEncoding = std::any_of(diagnostics.begin(), diagnostics.end(), isEncoding);
+  if (!imported || (badEncoding && loss != Loss::Accept)) {
     Output::DocumentErrors(DisplayName(path), diagnostics);
     return kUnusable;
   }
-  if (warnings)
-    *warnings = std::move(diagnostics);
-  return kSuccess;
+  std::vector<Diagnostic> losses;
+  for (Diagnostic& d : diagnostics)
+    if (isEncoding(d) || Styles::Tools::LosesContent(d))
+      losses.push_back(d);
+  if (losses.empty() || loss == Loss::Ignore)
+    return kSuccess;
+  if (loss == Loss::Accept) {
+    for (Diagnostic& d : losses)
+      d.severity = Severity::Warning;
+    Output::Warnings(DisplayName(path), losses);
+    return kSuccess;
+  }
+  for (Diagnostic& d : losses)
+    d.severity = Severity::Error;
+  Output::DocumentErrors(DisplayName(path), losses,
+                         "writing the document again would lose or change what is listed; "
+                         "--lossy accepts that");
+  return kUnusable;
+}
+
+// Reads `path` into `sheet` all or nothing.
+int LoadSheet(const std::string& path, StyleSheet& sheet, Loss loss = Loss::Ignore) {
+  Text text;
+  std::vector<Diagnostic> diagnostics;
+  if (const int status = ReadDocument(path, text, diagnostics))
+    return status;
+  std::vector<Diagnostic> found;
+  const bool imported = Styles::Tools::ImportChecked(sheet, text, true, &found);
+  diagnostics.insert(diagnostics.end(), found.begin(), found.end());
+  return Conclude(path, std::move(diagnostics), imported, loss);
 }
 
 // Reads from `path` only what the style `name` depends on, all or nothing:
 // a large document answers for one style at the cost of that style alone.
-int LoadStyle(const std::string& path, const std::string& name, StyleSheet& sheet) {
+int LoadStyle(const std::string& path, const std::string& name, StyleSheet& sheet,
+              Loss loss = Loss::Ignore) {
   Text text;
-  if (!ReadText(path, text)) {
-    Output::Error(DisplayName(path), "cannot be read");
-    return kUnreadable;
-  }
+  std::vector<Diagnostic> diagnostics;
+  if (const int status = ReadDocument(path, text, diagnostics))
+    return status;
   Json::Value value;
   Text parseError;
   if (!Json::Parse(text, value, parseError) || !value.Is<Json::Object>()) {
     // The full check says where the text goes wrong.
-    Output::DocumentErrors(DisplayName(path), Styles::Tools::ValidateDocument(text));
-    return kUnusable;
+    const std::vector<Diagnostic> found = Styles::Tools::ValidateDocument(text);
+    diagnostics.insert(diagnostics.end(), found.begin(), found.end());
+    return Conclude(path, std::move(diagnostics), false, loss);
   }
   Json::Object part = Styles::Tools::SelectStyles(value.Get<Json::Object>(), {FromUtf8(name)});
-  std::vector<Diagnostic> diagnostics;
-  if (!Styles::Tools::ImportChecked(sheet, part, true, &diagnostics)) {
-    Output::DocumentErrors(DisplayName(path), diagnostics);
-    return kUnusable;
-  }
-  return kSuccess;
+  std::vector<Diagnostic> found;
+  const bool imported = Styles::Tools::ImportChecked(sheet, part, true, &found);
+  Styles::Tools::LocateDiagnostics(text, found);
+  diagnostics.insert(diagnostics.end(), found.begin(), found.end());
+  return Conclude(path, std::move(diagnostics), imported, loss);
 }
 
 const Style* FindStyle(const StyleSheet& sheet, const std::string& document,
@@ -137,12 +182,13 @@ bool RegisterSchemaFile(const std::string& path, int& status) {
   if (path.empty()) {
     schema = Styles::Tools::DefaultSchema();
   } else {
-    Text text;
-    if (!ReadText(path, text)) {
-      Output::Error(DisplayName(path), "cannot be read");
+    std::string bytes, reason;
+    if (!ReadBytes(path, bytes, reason)) {
+      Output::Error(DisplayName(path), "cannot be read: " + reason);
       status = kUnreadable;
       return false;
     }
+    const Text text = DecodeUtf8(std::move(bytes));
     Styles::Tools::SchemaError error;
     if (!Styles::Tools::ParseSchema(text, schema, error)) {
       Output::Error(
@@ -169,12 +215,14 @@ int Validate(const CommonOptions& options, const std::vector<std::string>& docum
   bool unreadable = false;
   for (const std::string& document : documents) {
     Text text;
-    if (!ReadText(document, text)) {
-      Output::Error(DisplayName(document), "cannot be read");
+    std::vector<Diagnostic> diagnostics;
+    if (ReadDocument(document, text, diagnostics) != kSuccess) {
       unreadable = true;
       continue;
     }
-    files.push_back(FileDiagnostics{DisplayName(document), Styles::Tools::ValidateDocument(text)});
+    const std::vector<Diagnostic> found = Styles::Tools::ValidateDocument(text);
+    diagnostics.insert(diagnostics.end(), found.begin(), found.end());
+    files.push_back(FileDiagnostics{DisplayName(document), std::move(diagnostics)});
   }
   Output(options.json).Diagnostics(files);
   if (unreadable)
@@ -205,15 +253,18 @@ int Show(const CommonOptions& options, const std::string& document, const std::s
   return kSuccess;
 }
 
-int Flatten(const CommonOptions&, const std::string& document, const std::string& name) {
+int Flatten(const CommonOptions&, const std::string& document, const std::string& name,
+            bool lossy) {
   StyleSheet sheet;
-  if (const int status = LoadStyle(document, name, sheet))
+  if (const int status = LoadStyle(document, name, sheet, lossy ? Loss::Accept : Loss::Refuse))
     return status;
   const Style* style = FindStyle(sheet, document, name);
   if (!style)
     return kNegative;
   const std::unique_ptr<Style> flattened(style->CreateFlattenedStyle());
-  Output(true).Document(flattened->Serialize(sheet, true, true));
+  Json::Value value;
+  Styles::Tools::SerializeComplete(sheet, *flattened, value);
+  Output(true).Document(Json::ValueToString(value, true));
   return kSuccess;
 }
 
@@ -230,18 +281,26 @@ int Diff(const CommonOptions& options, const std::string& oldDocument,
   return differences.empty() ? kSuccess : kNegative;
 }
 
-int Format(const CommonOptions&, const std::string& document, bool compact) {
+int Format(const CommonOptions&, const std::string& document, const FormatOptions& format) {
   StyleSheet sheet;
-  std::vector<Diagnostic> warnings;
-  if (const int status = LoadSheet(document, sheet, &warnings))
+  if (const int status =
+          LoadSheet(document, sheet, format.lossy ? Loss::Accept : Loss::Refuse))
     return status;
-  // What the sheet did not take is left out of the rewritten document.
-  for (const Diagnostic& warning : warnings)
-    Output::Error(DisplayName(document), "warning: " + ToUtf8(warning.pointer) + ": " +
-                                             ToUtf8(warning.message) + " [" + warning.code + "]");
-  Json::Value value{Json::Object()};
-  sheet.ExportJson(value, true);
-  Output(true).Document(Json::ValueToString(value, !compact));
+  Json::Value value;
+  Styles::Tools::ExportComplete(sheet, value);
+  const Text text = Json::ValueToString(value, !format.compact);
+  const std::string target = format.inPlace ? document : format.output;
+  if (target.empty()) {
+    Output(true).Document(text);
+    return kSuccess;
+  }
+  // A temporary file renamed over the target: the target holds the old
+  // document or the new one, never a part.
+  std::string error;
+  if (!SystemIO::WriteFileAtomically(target, ToUtf8(text) + "\n", &error)) {
+    Output::Error(target, "cannot be written: " + error);
+    return kUnreadable;
+  }
   return kSuccess;
 }
 

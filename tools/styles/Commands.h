@@ -2,7 +2,8 @@
 // Each returns the process's exit status:
 //   0 success, 1 a negative answer (errors found, differences, no such style
 //   or preset), 2 bad usage (also a malformed schema), 3 a file or folder
-//   that cannot be read, 4 a document whose errors keep it from being used.
+//   that cannot be read or written, 4 a document whose errors keep it from
+//   being used, or a rewrite that would lose part of it.
 #pragma once
 
 #include "Output.h"
@@ -30,10 +31,22 @@ int Validate(const CommonOptions& options, const std::vector<std::string>& docum
 int List(const CommonOptions& options, const std::string& document);
 int Show(const CommonOptions& options, const std::string& document, const std::string& style,
          bool explain);
-int Flatten(const CommonOptions& options, const std::string& document, const std::string& style);
+// Prints the flattened style, temporary values included; refuses a document
+// whose reading loses content unless `lossy`.
+int Flatten(const CommonOptions& options, const std::string& document, const std::string& style,
+            bool lossy);
 int Diff(const CommonOptions& options, const std::string& oldDocument,
          const std::string& newDocument, bool effective);
-int Format(const CommonOptions& options, const std::string& document, bool compact);
+// How format writes the document.
+struct FormatOptions {
+  bool compact = false; // one line
+  bool lossy = false;   // rewrite even when reading loses content
+  std::string output;   // a file to write instead of standard output
+  bool inPlace = false; // write back to the document's own file
+};
+// Rewrites the document in canonical form, keeping all that the sheet holds;
+// refuses a document whose reading loses content unless format.lossy.
+int Format(const CommonOptions& options, const std::string& document, const FormatOptions& format);
 
 int PresetList(const CommonOptions& options, const std::string& folder, const std::string& set);
 int PresetShow(const CommonOptions& options, const std::string& folder, const std::string& set,

@@ -100,10 +100,9 @@ public:
                 u" has the name of a document's own member; its styles cannot be written");
     CheckRepeatedNames(document, nullptr);
     CollectStyles(document);
-    if (!m_understood && !document.IsEmpty())
+    if (!m_understood && m_unknownSeen)
       Add(Severity::Error, "nothing-read", Text(),
-          u"no member of the document is a registered category, the version or the id; "
-          u"nothing would be read");
+          u"no member of the document is a registered category; no style would be read");
     const int current = m_manager.GetCurrentVersion();
     if (m_versionSeen && current >= 0 && m_documentVersion > current)
       Add(Severity::Warning, "version-too-new", u"/version",
@@ -159,6 +158,7 @@ private:
         continue;
       }
       if (!m_manager.CategoryExists(name)) {
+        m_unknownSeen = true;
         Add(Severity::Warning, "unknown-category", where,
             u"category " + Quoted(name) + u" is not registered; its styles are skipped");
         continue;
@@ -226,7 +226,6 @@ private:
 
   void CheckSheetMember(const Text& name, const Json::Value& value, const Where& where) {
     if (name == kVersion) {
-      m_understood = true;
       if (const double* number = value.GetIf<double>()) {
         m_documentVersion = Styles::detail::TruncateVersion(*number);
         m_versionSeen = true;
@@ -234,10 +233,10 @@ private:
         Add(Severity::Error, "wrong-kind", where, u"the version must be a number");
       }
     } else if (name == kExternalID) {
-      m_understood = true;
       if (!value.Is<Text>())
         Add(Severity::Error, "wrong-kind", where, u"the sheet's id must be a string");
     } else {
+      m_unknownSeen = true;
       Add(Severity::Warning, "unknown-member", where,
           u"member " + Quoted(name) + u" is neither a category, the version nor the id");
     }
@@ -467,7 +466,8 @@ private:
   bool m_replace;
   int m_documentVersion = 0;
   bool m_versionSeen = false;
-  bool m_understood = false; // some member is a registered category, the version or the id
+  bool m_understood = false;  // some member is a registered category
+  bool m_unknownSeen = false; // some member is an unknown category or member
   std::unordered_set<std::u16string_view> m_reservedChecked;
   std::vector<DocumentStyle> m_styles;
   std::size_t m_current = kNone; // the document style being checked
