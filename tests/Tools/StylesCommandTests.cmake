@@ -29,7 +29,7 @@ styles_command_test(ValidateErrors 1 validate ${STYLES_SAMPLE} ${STYLES_CLI_FILE
   OUTPUT "broken.json:1:25: error: /paragraph/Body/spaceAfter: .*\\[bad-value\\].*\\[missing-parent\\]")
 # Bytes that are not UTF-8, a repeated member, a shortened number (each with
 # line and column) and a document of which nothing is read.
-styles_command_test(ValidateProblems 1 validate problems.json unread.json
+styles_command_test(ValidateProblems 1 validate problems.json unread.json surrogate.json
   RUN_IN ${STYLES_CLI_FILES} SAME_AS ${STYLES_CLI_FILES}/validate-problems.txt)
 styles_command_test(ValidateJson 1 validate --json ${STYLES_CLI_FILES}/broken.json
   OUTPUT "\"valid\": false.*\"code\": \"bad-value\".*\"pointer\": \"/paragraph/Body/spaceAfter\"")
