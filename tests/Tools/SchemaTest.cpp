@@ -13,6 +13,8 @@
 
 #include <gtest/gtest.h>
 
+#include <cmath>
+#include <limits>
 #include <map>
 #include <memory>
 #include <string>
@@ -158,6 +160,11 @@ TEST_F(StockBehaviourTest, PoliciesReadTextAndTypeChecksGuardBounds) {
       EXPECT_FALSE(c.readable);
     }
   }
+  // Numbers that no document could hold are refused, bounds or not.
+  const BaseStyleProperty* spaceAfter =
+      manager.GetStyleProperty(PropertyKey(u"paragraph"), PropertyKey(u"spaceAfter"));
+  for (const double number : {std::numeric_limits<double>::infinity(), std::nan("")})
+    EXPECT_FALSE(spaceAfter->CheckType(ZelUtils::Any(number)));
   // Colours are kept in upper case, so that equal colours compare equal.
   StyleSheet sheet;
   ASSERT_TRUE(sheet.ImportFromString(u"{\"character\": {\"C\": {\"colour\": \"#aabbcc\"}}}", true));
