@@ -96,6 +96,9 @@ styles_command_test(UnknownPresetCommand 2 --json preset lst --folder .
 styles_command_test(StandardInputTwice 2 diff - - ERROR "standard input \\(-\\) can be read only once")
 styles_command_test(StandardInputAsSchema 2 validate --schema - - ERROR "only once")
 styles_command_test(InPlaceStandardInput 2 format --in-place - ERROR "needs a file")
+styles_command_test(FormatIntoItself 2 format old.json WORK_DIR ${CMAKE_CURRENT_BINARY_DIR}/Into
+  COPY ${STYLES_CLI_FILES}/old.json RUN_IN ${CMAKE_CURRENT_BINARY_DIR}/Into
+  OUTPUT_TO ${CMAKE_CURRENT_BINARY_DIR}/Into/old.json ERROR "old.json: is also standard output")
 styles_command_test(InPlaceAndOutput 2 format --in-place -o x.json ${STYLES_SAMPLE} ERROR "excludes")
 styles_command_test(ValidateUnreadable 3 validate ${STYLES_CLI_FILES}/absent.json
   ERROR "absent.json: cannot be read: No such file or directory")

@@ -16,6 +16,9 @@
 #include <ZelUtils/Stream.h>
 #include <ZelUtils/TextStream.h>
 
+#include <sys/stat.h>
+#include <unistd.h>
+
 #include <algorithm>
 #include <filesystem>
 #include <iostream>
@@ -39,6 +42,14 @@ Styles::Tools::SchemaRegistration& Registration() {
 }
 
 std::string DisplayName(const std::string& path) { return path == "-" ? "<stdin>" : path; }
+
+// Whether the file `path` is the one standard output writes to, as with
+// "styles format a.json > a.json".
+bool IsStandardOutput(const std::string& path) {
+  struct stat file, output;
+  return path != "-" && ::stat(path.c_str(), &file) == 0 && ::fstat(STDOUT_FILENO, &output) == 0 &&
+         S_ISREG(output.st_mode) && file.st_dev == output.st_dev && file.st_ino == output.st_ino;
+}
 
 // How a command takes what reading a document cannot keep: a read-only one
 // ignores it, a rewriting one refuses it or (with --lossy) warns.
@@ -126,7 +137,13 @@ int LoadStyle(const std::string& path, const std::string& name, StyleSheet& shee
     diagnostics.insert(diagnostics.end(), found.begin(), found.end());
     return Conclude(path, std::move(diagnostics), false, loss);
   }
-  Json::Object part = Styles::Tools::SelectStyles(value.Get<Json::Object>(), {FromUtf8(name)});
+  Json::Object selected = Styles::Tools::SelectStyles(value.Get<Json::Object>(), {FromUtf8(name)});
+  // Other members of the sheet belong to no style, and what they hold is no
+  // loss to the style's answer.
+  Json::Object part;
+  for (Json::Member& member : selected)
+    if (member.value.Is<Json::Object>() || member.name == u"version" || member.name == u"id")
+      part.AddValue(std::move(member.name), std::move(member.value));
   std::vector<Diagnostic> found;
   const bool imported = Styles::Tools::ImportChecked(sheet, part, true, &found);
   Styles::Tools::LocateDiagnostics(text, found);
@@ -283,6 +300,11 @@ int Diff(const CommonOptions& options, const std::string& oldDocument,
 
 int Format(const CommonOptions&, const std::string& document, const FormatOptions& format) {
   StyleSheet sheet;
+  if (format.output.empty() && !format.inPlace && IsStandardOutput(document)) {
+    Output::Error(document, "is also standard output, which was emptied before it could be "
+                            "read; --in-place rewrites a document");
+    return kUsage;
+  }
   if (const int status =
           LoadSheet(document, sheet, format.lossy ? Loss::Accept : Loss::Refuse))
     return status;

@@ -71,6 +71,9 @@ bool ReadBytes(const std::string& path, std::string& bytes, std::string& reason)
 }
 
 std::optional<Styles::Tools::Diagnostic> FindInvalidUtf8(std::string_view bytes) {
+  // Text that starts with a UTF-16 byte-order mark is read as UTF-16.
+  if (bytes.substr(0, 2) == "\xFF\xFE" || bytes.substr(0, 2) == "\xFE\xFF")
+    return std::nullopt;
   int line = 1, column = 1;
   for (std::size_t i = 0; i < bytes.size();) {
     const std::size_t length = SequenceLength(bytes, i);

@@ -20,7 +20,7 @@ bool ReadBytes(const std::string& path, std::string& bytes, std::string& reason)
 
 // The first sequence of `bytes` that is not UTF-8, as an "invalid-utf8" error
 // with its line and column (from 1, columns in characters); none when every
-// byte is part of a character.
+// byte is part of a character, or when a UTF-16 byte-order mark starts them.
 std::optional<Styles::Tools::Diagnostic> FindInvalidUtf8(std::string_view bytes);
 
 // `bytes` decoded from UTF-8, a leading byte-order mark dropped; what is not

@@ -57,8 +57,14 @@ void ReadString(std::u16string_view text, std::size_t& i, std::u16string* decode
 
 void AppendToken(std::u16string& pointer, std::u16string_view token) {
   pointer += u'/';
-  for (const char16_t c : token)
-    pointer += c == u'~' ? u"~0" : c == u'/' ? u"~1" : std::u16string(1, c);
+  for (const char16_t c : token) {
+    if (c == u'~')
+      pointer += u"~0";
+    else if (c == u'/')
+      pointer += u"~1";
+    else
+      pointer += c;
+  }
 }
 
 } // namespace
