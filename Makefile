@@ -20,14 +20,24 @@ FUZZ_PACKAGES := clang libfuzzer-14-dev libclang-rt-14-dev
 ifeq ($(FUZZ),1)
 PACKAGES += $(FUZZ_PACKAGES)
 endif
+# And those that the browser tests need, installed only with BROWSER=1
+# (`make test-browser` asks): Debian's Chromium, a font for names in CJK
+# scripts, and Node.js. npm comes with some Node.js builds; Debian's is added
+# only where it is missing, then npm installs playwright-core from the lock file.
+BROWSER_PACKAGES := chromium fonts-droid-fallback nodejs
+ifeq ($(BROWSER),1)
+PACKAGES += $(BROWSER_PACKAGES)
+endif
 FUZZ_TARGETS := FuzzJsonParse FuzzImport FuzzTextStream FuzzValidate FuzzNames
 
 # The project version, shown in the reference.
 VERSION := $(shell sed -n 's/^project.Styles VERSION \([0-9.]*\).*/\1/p' CMakeLists.txt)
 
 CMAKE_FLAGS := -DCMAKE_BUILD_TYPE=$(BUILD_TYPE) -DSTYLES_WARNINGS_AS_ERRORS=$(WERROR)
+BROWSER_TESTS ?= OFF
 
-.PHONY: all deps docs-deps configure build test test-asan bench fuzz demo docs install format clean
+.PHONY: all deps docs-deps browser-deps configure build test test-asan test-browser test-ratio \
+  mutate bench fuzz demo docs install format clean
 
 all: build
 
@@ -47,18 +57,32 @@ endef
 
 deps:
 	$(call install-missing,$(PACKAGES) $(if $(DOCS),$(DOCS_PACKAGES)),build dependencies)
+	$(if $(filter 1,$(BROWSER)),@$(MAKE) --no-print-directory browser-deps)
+
+browser-deps:
+	@command -v npm >/dev/null 2>&1 || { apt-get update && \
+	  DEBIAN_FRONTEND=noninteractive apt-get install -y --no-install-recommends npm; }
+	cd tests/browser && npm ci --no-audit --no-fund
 
 docs-deps:
 	$(call install-missing,$(DOCS_PACKAGES),documentation dependencies)
 
 configure: deps
-	cmake -S . -B $(BUILD_DIR) $(CMAKE_FLAGS)
+	cmake -S . -B $(BUILD_DIR) $(CMAKE_FLAGS) -DSTYLES_BROWSER_TESTS=$(BROWSER_TESTS)
 
 build: configure
 	cmake --build $(BUILD_DIR) -j $(JOBS)
 
 test: build
 	cd $(BUILD_DIR) && ctest --output-on-failure -j $(JOBS)
+
+# The report pages opened in headless Chromium, with what that needs.
+test-browser:
+	$(MAKE) deps BROWSER=1
+	cmake -S . -B $(BUILD_DIR) $(CMAKE_FLAGS) -DSTYLES_BROWSER_TESTS=ON
+	cmake --build $(BUILD_DIR) -j $(JOBS) --target styles
+	cd $(BUILD_DIR) && ctest --output-on-failure -L browser
+	@echo "Browser tests ran: the styles report pages in headless Chromium"
 
 # The whole suite under AddressSanitizer, LeakSanitizer and UBSan.
 test-asan: deps
@@ -67,6 +91,15 @@ test-asan: deps
 	cmake --build $(ASAN_BUILD_DIR) -j $(JOBS)
 	cd $(ASAN_BUILD_DIR) && ASAN_OPTIONS=detect_leaks=1:strict_string_checks=1 \
 	  UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1 ctest --output-on-failure -j $(JOBS)
+
+# Test code as a share of the rest; fails above 0.38.
+test-ratio:
+	tools/test-ratio.sh
+
+# Plants single faults one at a time in a sanitizer build and reports which
+# ones the suite catches (tens of minutes).
+mutate: deps
+	python3 tools/mutate.py
 
 bench: deps
 	cmake -S . -B $(BENCH_BUILD_DIR) -DCMAKE_BUILD_TYPE=Release -DSTYLES_BUILD_BENCHMARKS=ON \
@@ -122,4 +155,4 @@ format:
 	find Engines tests benchmarks examples fuzz -name '*.h' -o -name '*.cpp' | xargs clang-format -i
 
 clean:
-	rm -rf $(BUILD_DIR) $(ASAN_BUILD_DIR) $(BENCH_BUILD_DIR) $(DOCS_BUILD_DIR) $(FUZZ_BUILD_DIR)
+	rm -rf $(BUILD_DIR) $(ASAN_BUILD_DIR) build-mutate $(BENCH_BUILD_DIR) $(DOCS_BUILD_DIR) $(FUZZ_BUILD_DIR)

@@ -1,6 +1,8 @@
 #include "Commands.h"
 
+#include "Graph.h"
 #include "Input.h"
+#include "Report.h"
 
 #include <StylesTools/Diff.h>
 #include <StylesTools/Schema.h>
@@ -42,6 +44,11 @@ Styles::Tools::SchemaRegistration& Registration() {
 }
 
 std::string DisplayName(const std::string& path) { return path == "-" ? "<stdin>" : path; }
+
+// A document's file name without its folder, to title a page or graph.
+std::string TitleOf(const std::string& path) {
+  return std::filesystem::path(DisplayName(path)).filename().string();
+}
 
 // Whether the file `path` is the one standard output writes to, as with
 // "styles format a.json > a.json".
@@ -323,6 +330,27 @@ int Format(const CommonOptions&, const std::string& document, const FormatOption
     Output::Error(target, "cannot be written: " + error);
     return kUnreadable;
   }
+  return kSuccess;
+}
+
+int Report(const CommonOptions&, const std::string& document, const std::string& output,
+           const std::string& against) {
+  StyleSheet sheet, oldSheet;
+  if (const int status = LoadSheet(document, sheet))
+    return status;
+  if (!against.empty())
+    if (const int status = LoadSheet(against, oldSheet))
+      return status;
+  return WriteOutput(BuildReport(sheet, TitleOf(document), against.empty() ? nullptr : &oldSheet,
+                                 TitleOf(against)),
+                     output);
+}
+
+int Graph(const CommonOptions&, const std::string& document) {
+  StyleSheet sheet;
+  if (const int status = LoadSheet(document, sheet))
+    return status;
+  WriteDot(sheet, TitleOf(document), std::cout);
   return kSuccess;
 }
 

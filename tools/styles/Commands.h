@@ -47,6 +47,12 @@ struct FormatOptions {
 // Rewrites the document in canonical form, keeping all that the sheet holds;
 // refuses a document whose reading loses content unless format.lossy.
 int Format(const CommonOptions& options, const std::string& document, const FormatOptions& format);
+// The HTML report of `document` to `output` (standard output when empty),
+// marking what changed since `against` when it is not empty.
+int Report(const CommonOptions& options, const std::string& document, const std::string& output,
+           const std::string& against);
+// The inheritance graph of `document` as Graphviz DOT.
+int Graph(const CommonOptions& options, const std::string& document);
 
 int PresetList(const CommonOptions& options, const std::string& folder, const std::string& set);
 int PresetShow(const CommonOptions& options, const std::string& folder, const std::string& set,

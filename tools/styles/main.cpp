@@ -101,7 +101,7 @@ int main(int argc, char** argv) {
   AddCommonOptions(app, options);
 
   std::vector<std::string> documents;
-  std::string document, otherDocument, style, folder, set, name;
+  std::string document, otherDocument, style, folder, set, name, outputFile;
   bool explain = false, effective = false, replace = false, lossy = false;
   FormatOptions formatOptions;
 
@@ -131,6 +131,14 @@ int main(int argc, char** argv) {
   format->add_flag("--in-place", formatOptions.inPlace, "Replace the document's file whole")
       ->excludes(output);
 
+  CLI::App* report =
+      app.add_subcommand("report", "Write an HTML page of the inheritance graphs and values");
+  report->add_option("document", document, "Document, or -")->required();
+  report->add_option("-o,--output", outputFile, "HTML file to write (default: standard output)");
+  report->add_option("--against", otherDocument, "Older document whose differences are marked");
+  CLI::App* graph = app.add_subcommand("graph", "Print the inheritance graph as Graphviz DOT");
+  graph->add_option("document", document, "Document, or -")->required();
+
   CLI::App* preset = app.add_subcommand("preset", "Work on preset files in a folder");
   preset->require_subcommand(1);
   CLI::App* presetList = preset->add_subcommand("list", "List the sets, or the presets of SET");
@@ -149,8 +157,8 @@ int main(int argc, char** argv) {
   presetAdd->add_option("--name", name, "Preset name (default: the style's name)");
   presetAdd->add_flag("--replace", replace, "Replace a preset of that name");
 
-  for (CLI::App* command : {validate, list, show, flatten, diff, format, presetList, presetShow,
-                            presetAdd, presetDelete})
+  for (CLI::App* command : {validate, list, show, flatten, diff, format, report, graph, presetList,
+                            presetShow, presetAdd, presetDelete})
     AddCommonOptions(*command, options);
 
   int status = kSuccess;
@@ -197,6 +205,10 @@ int main(int argc, char** argv) {
       status = Diff(options, document, otherDocument, effective);
     else if (format->parsed())
       status = Format(options, document, formatOptions);
+    else if (report->parsed())
+      status = Report(options, document, outputFile, otherDocument);
+    else if (graph->parsed())
+      status = Graph(options, document);
     else if (presetList->parsed())
       status = PresetList(options, folder, set);
     else if (presetShow->parsed())

@@ -211,16 +211,4 @@ TEST(JsonTest, EqualityIsDeepAndOrderedAcrossKinds) {
   EXPECT_EQ(Value(Json::NullType()), Value());
 }
 
-TEST(JsonTest, ConstructorsPickTheIntendedKind) {
-  static_assert(!std::is_constructible<Value, int*>::value, "pointers must not become bools");
-  static_assert(!std::is_constructible<Value, std::nullptr_t>::value, "null is NullType");
-  for (const Value& number : {Value(1), Value(2u), Value(std::int64_t{3}), Value(4.5f)})
-    EXPECT_TRUE(number.Is<double>());
-  EXPECT_TRUE(Value(true).Is<bool>());
-  EXPECT_TRUE(Value(u"x").Is<Text>());
-  EXPECT_TRUE(Value("x").Is<ZelStringT<char>>());
-  EXPECT_THROW(Value(7).Get<bool>(), std::bad_cast);
-  EXPECT_THROW(Value(7).Get<Object>(), std::bad_cast);
-}
-
 } // namespace

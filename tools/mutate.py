@@ -1,0 +1,336 @@
+#!/usr/bin/env python3
+"""Plants realistic single faults in the library, the toolkit and the command,
+one at a time, and tells which ones the test suite catches.
+
+Each fault names a piece of text that must occur exactly once among the files
+of its area; the script replaces it, rebuilds, runs the suite (stopping at the
+first failure), and restores the file. A fault whose text is no longer found
+(the code moved on) is reported as stale, not counted. The build is the
+sanitizer build, so leaks, double frees and use after free count as caught.
+
+Usage: tools/mutate.py [--build-dir DIR] [--only ID[,ID...]] [--list]
+"""
+
+import argparse
+import glob
+import os
+import re
+import subprocess
+import sys
+import time
+
+ROOT = os.path.dirname(os.path.dirname(os.path.abspath(__file__)))
+
+LIBRARY = ["Engines/Styles/Styles/**/*.cpp", "Engines/Styles/Styles/**/*.h"]
+PLATFORM = ["Engines/Platform/**/*.cpp", "Engines/Platform/**/*.h"]
+TOOLKIT = ["Engines/StylesTools/**/*.cpp", "Engines/StylesTools/**/*.h"]
+COMMAND = ["tools/styles/*.cpp", "tools/styles/*.h"]
+
+# (id, area, what the fault is, text, replacement)
+FAULTS = [
+    # Lookup and inheritance
+    ("inherited-reads-self", LIBRARY, "wrong variable: the inherited lookup reads the style itself",
+     "if (const ZelUtils::Any* own = parent->m_properties.Find(key))",
+     "if (const ZelUtils::Any* own = current->m_properties.Find(key))"),
+    ("owner-counterpart", LIBRARY, "wrong variable: owner-based inheritance starts at the owner",
+     "const Style* counterpart = ownerWithParent->m_parent;",
+     "const Style* counterpart = ownerWithParent;"),
+    ("get-out-default", LIBRARY, "dropped check: the out form reports the category default",
+     "  if (&value == &behaviour->GetDefaultValue())\n    return false;\n  out = value;\n  return true;\n}\n\nbool Style::GetInheritedProperty",
+     "  out = value;\n  return true;\n}\n\nbool Style::GetInheritedProperty"),
+    ("path-default-category", LIBRARY, "wrong variable: a path off the own substyles ends in the root's default",
+     "      if (!category)\n        throw std::exception();\n      return category->GetDefaultValue(last);",
+     "      if (!category)\n        throw std::exception();\n      return m_category->GetDefaultValue(last);"),
+    # Editing
+    ("copy-set-stores-empty", LIBRARY, "dropped check: the copying SetProperty stores an empty result",
+     "  if (!result.IsEmpty())\n    m_properties.Insert(key, std::move(result));",
+     "  m_properties.Insert(key, std::move(result));"),
+    ("move-set-no-destroy", LIBRARY, "missing call: the moving SetProperty leaks the old value",
+     "    behaviour->DestroyPropertyData(*old);\n    // The destroy step may have edited the values: look again.",
+     "    // The destroy step may have edited the values: look again."),
+    ("category-frees-nothing", LIBRARY, "dropped check: a change of category leaks orphaned substyles",
+     "if (behaviour && holdsSubstyles && (!next || typeid(*next) != typeid(*behaviour))) {",
+     "if (false && behaviour && holdsSubstyles) {"),
+    ("category-drops-plain", LIBRARY, "inverted condition: a change of category frees plain values",
+     "if (behaviour && holdsSubstyles && (!next || typeid(*next) != typeid(*behaviour))) {",
+     "if (behaviour && (!next || typeid(*next) != typeid(*behaviour))) {"),
+    ("revert-short-circuit", LIBRARY, "short circuit: reverting skips later single substyles",
+     "removed = (*substyle)->RevertAllProperties() || removed;",
+     "removed = removed || (*substyle)->RevertAllProperties();"),
+    # Comparison
+    ("order-size", LIBRARY, "wrong comparison: ordering by map size reversed",
+     "return m_properties.size() < other.m_properties.size();",
+     "return m_properties.size() > other.m_properties.size();"),
+    ("order-swapped", LIBRARY, "swapped arguments: value ordering reversed",
+     "return behaviour->IsLess(mine.second, theirs.second);",
+     "return behaviour->IsLess(theirs.second, mine.second);"),
+    ("equal-unregistered", LIBRARY, "dropped check: a key without behaviour counts as equal",
+     "if (!behaviour || !behaviour->IsEqual(mine.second, theirs.second))\n      return false;",
+     "if (behaviour && !behaviour->IsEqual(mine.second, theirs.second))\n      return false;"),
+    # Registry
+    ("reverse-order", LIBRARY, "wrong order: behaviours deleted in registration order",
+     "for (auto key = m_categoryOrder.rbegin(); key != m_categoryOrder.rend(); ++key) {",
+     "for (auto key = m_categoryOrder.begin(); key != m_categoryOrder.end(); ++key) {"),
+    ("untranslate-no-case", LIBRARY, "wrong comparison: UI names match in any letter case",
+     "if (entry.second->GetUIName().Compare(uiName, kCompareCaseSensitive) == 0)",
+     "if (entry.second->GetUIName().CompareNoCase(uiName) == 0)"),
+    ("substyle-set-flag", LIBRARY, "dropped check: every category joins the ordinary styles",
+     "  if (addToStyleCategory)\n    m_substyleSetCategories.push_back(key);",
+     "  m_substyleSetCategories.push_back(key);"),
+    # Substyles
+    ("substyle-no-owner", LIBRARY, "missing call: a copied substyle names no owner",
+     "  Style* copy = new Style(*source);\n  copy->SetOwner(owner, GetName());",
+     "  Style* copy = new Style(*source);"),
+    ("substyle-merge-overwrite", LIBRARY, "wrong argument: merging into an own substyle always overwrites",
+     "own->MergeProperties(sourceSubstyle, overwrite);",
+     "own->MergeProperties(sourceSubstyle, true);"),
+    ("substyle-dependency-self", LIBRARY, "dropped check: a substyle in the span is no dependency",
+     "return styles.contains(substyle) || substyle->HasDependency(styles, false);",
+     "return substyle->HasDependency(styles, false);"),
+    ("array-destroy", LIBRARY, "missing call: destroying an array leaks its substyles",
+     "  for (Style* substyle : HeldList(value))\n    delete substyle;",
+     "  (void)HeldList(value);"),
+    # Dependencies, merging, flattening
+    ("remove-dependency-once", LIBRARY, "off by one: only the nearest removed parent is merged in",
+     "while (m_parent && styles.contains(m_parent))\n      MergeParent();",
+     "if (m_parent && styles.contains(m_parent))\n      MergeParent();"),
+    ("merge-parent-cuts", LIBRARY, "wrong value: merging a parent in cuts the chain above it",
+     "  MergeParentProperties(parent);\n  m_parent = parent->m_parent;",
+     "  MergeParentProperties(parent);\n  m_parent = nullptr;"),
+    ("flatten-keeps-parent", LIBRARY, "missing step: a flattened style keeps its parent",
+     "  m_parent = nullptr;\n  return !flattenedKeys.empty();",
+     "  return !flattenedKeys.empty();"),
+    ("parental-owner", LIBRARY, "dropped check: an owner's parent is no parental dependency",
+     "if (m_parent || (m_owner && m_owner->m_parent))",
+     "if (m_parent)"),
+    # Serialisation
+    ("minimum-version", LIBRARY, "off by one: a value of the document's own version is not written",
+     "  if (sheet.GetVersion() < GetMinimumVersion())\n    return false;\n  out = JsonValue();\n  if (m_policy)",
+     "  if (sheet.GetVersion() <= GetMinimumVersion())\n    return false;\n  out = JsonValue();\n  if (m_policy)"),
+    ("bool-text", LIBRARY, "swapped values: JSON true reads as 0",
+     'text = *flag ? u"1" : u"0";', 'text = *flag ? u"0" : u"1";'),
+    ("temporary-inverted", LIBRARY, "inverted condition: temporary values written only when excluded",
+     "if (!behaviour || (!includeTemporary && behaviour->IsTemporary()))",
+     "if (!behaviour || (includeTemporary && behaviour->IsTemporary()))"),
+    # Sheets
+    ("cycle-refusal", LIBRARY, "inverted condition: import accepts a parent that closes a cycle",
+     "    if (FindRoot(above) == node) {", "    if (FindRoot(above) != node) {"),
+    ("cycle-self", LIBRARY, "dropped check: import lets a style inherit from itself",
+     "    if (child == parent)\n      return false;\n", ""),
+    ("delete-no-repair", LIBRARY, "missing call: deleting styles leaves children pointing at them",
+     "      style->RemoveDependency(doomed, true);\n  for (Style* style : styles) {",
+     "      (void)style;\n  for (Style* style : styles) {"),
+    ("rename-onto-taken", LIBRARY, "dropped check: renaming onto a taken name",
+     "  } else if (!taken) {\n    Style* style = entry->style;",
+     "  } else {\n    Style* style = entry->style;"),
+    ("valid-name-trim", LIBRARY, "missing call: valid style names keep outer spaces",
+     "  result.Trim();\n  return result;", "  return result;"),
+    ("substyle-path-order", LIBRARY, "missing step: a substyle handle's path runs inside out",
+     "  std::reverse(m_path.begin(), m_path.end());\n}", "}"),
+    # Presets
+    ("preset-no-replace", LIBRARY, "dropped call: a preset save never moves the file into place",
+     "if (!SystemIO::File::Replace(m_path, target))", "if (false)"),
+    ("preset-keeps-dependencies", LIBRARY, "missing call: a preset keeps references to the source sheet",
+     "  copy->RemoveAllDependencies();\n", ""),
+    ("set-name-backslash", LIBRARY, "dropped check: a set name may hold a backslash",
+     "if (c == u'/' || c == u'\\\\' || c == u'\\0')", "if (c == u'/' || c == u'\\0')"),
+    ("set-list-extension", LIBRARY, "dropped check: files of any extension are listed as sets",
+     "if (GetFileName(name) == file && IsValidSetName(name))", "if (IsValidSetName(name))"),
+    # Platform: case folding, names, numbers
+    ("fold-ascii-off-by-one", PLATFORM, "off by one: 'A' does not fold",
+     "return (c >= 'A' && c <= 'Z') ? c + ('a' - 'A') : c;",
+     "return (c > 'A' && c <= 'Z') ? c + ('a' - 'A') : c;"),
+    ("fold-kelvin", PLATFORM, "wrong operator: a non-ASCII unit that folds to ASCII is compared raw",
+     "if (!IsAscii(ca) || !IsAscii(cb))\n      return rest(a.substr(i), b.substr(i));",
+     "if (!IsAscii(ca) && !IsAscii(cb))\n      return rest(a.substr(i), b.substr(i));"),
+    ("unused-name-space", PLATFORM, "inverted condition: a trailing number counts without its space",
+     "text[digitsStart - 1] == u' ')", "text[digitsStart - 1] != u' ')"),
+    ("decimal-trailing-zero", PLATFORM, "off by one: numbers keep a trailing zero",
+     "while (decimals > 0 && magnitude % 10 == 0) {", "while (decimals > 1 && magnitude % 10 == 0) {"),
+    ("json-negative-zero", PLATFORM, "dropped check: negative zero is written as -0",
+     '    if (digits == "-0")\n      digits = "-0.0";\n', ""),
+    ("json-depth", PLATFORM, "off by one: the nesting limit lets one more level through",
+     "if (++m_depth > kMaxDepth + 1)", "if (++m_depth > kMaxDepth + 2)"),
+    # Toolkit
+    ("provenance-owner-source", TOOLKIT, "missing step: values through the owner's parent count as ancestors",
+     "    source = ValueSource::Owner;\n", ""),
+    ("provenance-ancestor", TOOLKIT, "wrong variable: the source names the child of the ancestor",
+     "return Resolution{own, source, parent, nullptr, owner};",
+     "return Resolution{own, source, current, nullptr, owner};"),
+    ("describe-order", TOOLKIT, "wrong order: a substyle path is described inside out",
+     "for (auto key = keys.rbegin(); key != keys.rend(); ++key)",
+     "for (auto key = keys.begin(); key != keys.end(); ++key)"),
+    ("diff-always-effective", TOOLKIT, "dropped check: every diff lists effective changes",
+     "if (effective && itA->second && itB->second)", "if (itA->second && itB->second)"),
+    ("diff-swapped-order", TOOLKIT, "swapped arguments: added and removed styles exchanged",
+     ": itA->first.CompareNoCase(itB->first);", ": itB->first.CompareNoCase(itA->first);"),
+    ("diff-equal-values", TOOLKIT, "dropped check: equal values are reported as changed",
+     "      if (valueA && valueB && behaviour->IsEqual(*valueA, *valueB))\n        continue;\n", ""),
+    ("schema-maximum", TOOLKIT, "wrong comparison: the maximum itself is refused",
+     "(!property.maximum || number <= *property.maximum);",
+     "(!property.maximum || number < *property.maximum);"),
+    # The command
+    ("diff-exit-status", COMMAND, "wrong value: a diff with differences exits 0",
+     "return differences.empty() ? kSuccess : kNegative;", "return kSuccess;"),
+    ("stdin-name", COMMAND, "wrong value: standard input is not named as such",
+     'return path == "-" ? "<stdin>" : path;', "return path;"),
+    ("report-script-escape", COMMAND, "wrong value: the report's data lets \"</script>\" end its script",
+     "if (c == u'<')", "if (c == u'>')"),
+    ("graph-dot-escape", COMMAND, "dropped check: DOT text leaves backslashes unescaped",
+     "if (c == '\"' || c == '\\\\')", "if (c == '\"')"),
+    ("graph-list-index", COMMAND, "off by one: substyle list paths count from 1",
+     "FromUtf8(std::to_string(i))", "FromUtf8(std::to_string(i + 1))"),
+]
+
+
+def files_of(patterns):
+    found = []
+    for pattern in patterns:
+        found.extend(glob.glob(os.path.join(ROOT, pattern), recursive=True))
+    return sorted(set(found))
+
+
+def locate(patterns, text):
+    """The one file holding `text` exactly once, or None."""
+    hits = []
+    for path in files_of(patterns):
+        with open(path, encoding="utf-8") as f:
+            count = f.read().count(text)
+        hits.extend([path] * count)
+    return hits[0] if len(hits) == 1 else None
+
+
+def run(command, log, timeout):
+    try:
+        result = subprocess.run(command, cwd=ROOT, stdout=log, stderr=subprocess.STDOUT,
+                                timeout=timeout)
+        return result.returncode
+    except subprocess.TimeoutExpired:
+        return "timeout"
+
+
+def configure(build_dir, log):
+    return run(["cmake", "-S", ".", "-B", build_dir, "-DCMAKE_BUILD_TYPE=Debug",
+                "-DSTYLES_SANITIZE=ON", "-DSTYLES_BUILD_EXAMPLES=OFF"], log, 600)
+
+
+def build(build_dir, log):
+    return run(["cmake", "--build", build_dir, "-j", str(os.cpu_count() or 2)], log, 1800)
+
+
+def gtest_programs(build_dir):
+    return sorted(p for p in glob.glob(os.path.join(build_dir, "tests", "*Tests"))
+                  if os.access(p, os.X_OK))
+
+
+def other_tests(build_dir):
+    """The CTest tests that are not cases of a GoogleTest program: those run
+    through CTest, the cases in one process per program, which is much faster."""
+    listed = subprocess.run(["ctest", "--test-dir", build_dir, "-N"], capture_output=True,
+                            text=True).stdout
+    names = [line.split(": ", 1)[1].strip() for line in listed.splitlines()
+             if line.strip().startswith("Test") and ": " in line]
+    cases = set()
+    for program in gtest_programs(build_dir):
+        suite = ""
+        for line in subprocess.run([program, "--gtest_list_tests"], capture_output=True,
+                                   text=True).stdout.splitlines():
+            if not line.startswith(" "):
+                suite = line.split()[0] if line.strip() else ""
+            else:
+                cases.add(suite + line.split()[0])
+    return [n for n in names if n not in cases]
+
+
+def test(build_dir, log):
+    env = os.environ.copy()
+    env["ASAN_OPTIONS"] = "detect_leaks=1"
+    env["UBSAN_OPTIONS"] = "halt_on_error=1:print_stacktrace=1"
+    try:
+        for program in gtest_programs(build_dir):
+            result = subprocess.run([program, "--gtest_fail_fast", "--gtest_brief=1"],
+                                    cwd=os.path.dirname(program),
+                                    stdout=log, stderr=subprocess.STDOUT, env=env, timeout=300)
+            if result.returncode != 0:
+                return result.returncode
+        others = other_tests(build_dir)
+        if not others:
+            return 0
+        pattern = "^(" + "|".join(re.escape(n) for n in others) + ")$"
+        result = subprocess.run(["ctest", "--test-dir", build_dir, "-R", pattern,
+                                 "-j", str(os.cpu_count() or 2), "--stop-on-failure",
+                                 "--timeout", "120"],
+                                cwd=ROOT, stdout=log, stderr=subprocess.STDOUT, env=env,
+                                timeout=1800)
+        return result.returncode
+    except subprocess.TimeoutExpired:
+        return "timeout"
+
+
+def main():
+    parser = argparse.ArgumentParser(description=__doc__.splitlines()[0])
+    parser.add_argument("--build-dir", default="build-mutate")
+    parser.add_argument("--only", default="")
+    parser.add_argument("--list", action="store_true")
+    args = parser.parse_args()
+
+    chosen = [f for f in FAULTS if not args.only or f[0] in args.only.split(",")]
+    if args.list:
+        for fault in chosen:
+            where = locate(fault[1], fault[3])
+            print(f"{fault[0]:28} {os.path.relpath(where, ROOT) if where else 'STALE'}")
+        return 0
+
+    build_dir = os.path.join(ROOT, args.build_dir)
+    os.makedirs(build_dir, exist_ok=True)
+    log_path = os.path.join(build_dir, "mutate.log")
+    with open(log_path, "w") as log:
+        if configure(build_dir, log) != 0 or build(build_dir, log) != 0 or test(build_dir, log) != 0:
+            print(f"the unmutated build or suite fails; see {log_path}")
+            return 2
+
+    caught = survived = stale = broken = 0
+    survivors = []
+    for fault_id, patterns, description, text, replacement in chosen:
+        path = locate(patterns, text)
+        if not path:
+            print(f"stale     {fault_id}: its text is gone or not unique")
+            stale += 1
+            continue
+        with open(path, encoding="utf-8") as f:
+            original = f.read()
+        started = time.time()
+        try:
+            with open(path, "w", encoding="utf-8") as f:
+                f.write(original.replace(text, replacement, 1))
+            with open(os.path.join(build_dir, f"mutate-{fault_id}.log"), "w") as log:
+                built = build(build_dir, log)
+                outcome = test(build_dir, log) if built == 0 else None
+        finally:
+            with open(path, "w", encoding="utf-8") as f:
+                f.write(original)
+        seconds = time.time() - started
+        if outcome is None:
+            verdict, broken = "no-build", broken + 1
+        elif outcome == 0:
+            verdict, survived = "SURVIVED", survived + 1
+            survivors.append(fault_id)
+        else:
+            verdict, caught = "caught", caught + 1
+        print(f"{verdict:9} {fault_id}: {description} "
+              f"({os.path.relpath(path, ROOT)}, {seconds:.0f} s)", flush=True)
+
+    # Leaves the build as the sources are.
+    with open(log_path, "a") as log:
+        build(build_dir, log)
+    counted = caught + survived
+    share = 100.0 * caught / counted if counted else 0.0
+    print(f"\n{caught} caught, {survived} survived of {counted} faults ({share:.0f}%); "
+          f"{stale} stale, {broken} did not build")
+    if survivors:
+        print("survivors: " + ", ".join(survivors))
+    return 0 if counted and share >= 90.0 else 1
+
+
+if __name__ == "__main__":
+    sys.exit(main())
