@@ -3,8 +3,11 @@
 // of the longest chain (read, find, resolve every effective value). The
 // documents use the built-in schema: paragraphs in chains of a hundred, a
 // fifth of them with a character substyle, some of those based on one of the
-// character styles that make up a fifth of the sheet.
+// character styles that make up a fifth of the sheet. Last, "diff --effective"
+// of two versions of one long chain, from 5k to 40k styles, whose time must
+// grow as the chain does: the summary gives the factor from 5k to 40k.
 #include <StylesTools/Diagnostics.h>
+#include <StylesTools/Diff.h>
 #include <StylesTools/Provenance.h>
 #include <StylesTools/Schema.h>
 
@@ -16,7 +19,9 @@
 #include <benchmark/benchmark.h>
 
 #include <cstdio>
+#include <map>
 #include <string>
+#include <vector>
 
 namespace {
 
@@ -126,4 +131,71 @@ void BM_ShowExplain(benchmark::State& state) {
 }
 BENCHMARK(BM_ShowExplain)->Arg(10000)->Arg(100000)->Unit(benchmark::kMillisecond);
 
+// One chain of `count` paragraphs, each inheriting from the one before; only
+// the root sets spaceAfter, so changing it changes every style's effective value.
+Text MakeChain(int count, int rootValue) {
+  std::string text =
+      "{\"version\":1,\"paragraph\":{\"P0\":{\"spaceAfter\":\"" + std::to_string(rootValue) + "\"}";
+  for (int i = 1; i < count; ++i)
+    text += ",\"P" + std::to_string(i) + "\":{\"inherits\":\"P" + std::to_string(i - 1) + "\"}";
+  text += "}}";
+  return Text(ZelPlatform::Utf8ToUtf16(text));
+}
+
+void BM_DiffEffectiveChain(benchmark::State& state) {
+  RegisterDefaultSchema();
+  const int count = static_cast<int>(state.range(0));
+  Styles::StyleSheet oldSheet, newSheet;
+  if (!oldSheet.ImportFromString(MakeChain(count, 1), true) ||
+      !newSheet.ImportFromString(MakeChain(count, 2), true))
+    state.SkipWithError("the chains should import");
+  for (auto _ : state) {
+    const auto differences = Styles::Tools::DiffSheets(oldSheet, newSheet, true);
+    if (differences.size() != static_cast<std::size_t>(count))
+      state.SkipWithError("every style should differ once");
+    benchmark::DoNotOptimize(differences.data());
+  }
+  SetStylesPerSecond(state);
+}
+BENCHMARK(BM_DiffEffectiveChain)
+    ->Arg(5000)
+    ->Arg(10000)
+    ->Arg(20000)
+    ->Arg(40000)
+    ->Unit(benchmark::kMillisecond);
+
+// Keeps the chain diff's CPU times for the summary: on a shared machine they
+// move less than wall-clock times.
+class ChainReporter : public benchmark::ConsoleReporter {
+public:
+  void ReportRuns(const std::vector<Run>& runs) override {
+    ConsoleReporter::ReportRuns(runs);
+    for (const Run& run : runs)
+      if (!run.error_occurred && run.run_type == Run::RT_Iteration)
+        m_times[run.run_name.str()] = run.GetAdjustedCPUTime();
+  }
+  void PrintSummary() const {
+    const auto small = m_times.find("BM_DiffEffectiveChain/5000");
+    const auto large = m_times.find("BM_DiffEffectiveChain/40000");
+    if (small != m_times.end() && large != m_times.end())
+      std::printf("\ndiff --effective of a chain, 8x the styles (5k to 40k): %.1fx the CPU "
+                  "time (8x is linear, 64x quadratic)\n",
+                  large->second / small->second);
+  }
+
+private:
+  std::map<std::string, double> m_times;
+};
+
 } // namespace
+
+int main(int argc, char** argv) {
+  benchmark::Initialize(&argc, argv);
+  if (benchmark::ReportUnrecognizedArguments(argc, argv))
+    return 1;
+  ChainReporter reporter;
+  benchmark::RunSpecifiedBenchmarks(&reporter);
+  reporter.PrintSummary();
+  benchmark::Shutdown();
+  return 0;
+}

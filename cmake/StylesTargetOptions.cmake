@@ -17,6 +17,7 @@ function(styles_target_options target)
   endif()
   if(STYLES_BUILD_FUZZERS)
     # Coverage for libFuzzer everywhere; only the fuzz targets link its main.
+    # Optimised (the Debug configuration adds no -O), assertions on.
     target_compile_options(${target} PRIVATE -O1 -fsanitize=fuzzer-no-link,address,undefined
       -fno-sanitize-recover=undefined -fno-omit-frame-pointer
       -fsanitize-ignorelist=${PROJECT_SOURCE_DIR}/fuzz/sanitizer-ignorelist.txt)

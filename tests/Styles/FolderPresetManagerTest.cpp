@@ -16,6 +16,7 @@
 #include <thread>
 #include <vector>
 
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -40,6 +41,7 @@ TEST_F(FolderPresetManagerTest, SetsRoundTripThroughAFreshManager) {
     }
     ASSERT_TRUE(manager.Save(u"Empty"));
   }
+  WriteFile(".tmp-1-0-0123456789abcdef", "{}"); // a live writer's file is no set
   FolderPresetManager fresh(Folder());
   EXPECT_EQ(fresh.GetPresetSetNames(), (Names{u"Body", u"Empty"}));
   EXPECT_EQ(fresh.GetPresetNames(u"Body").size(), presetNames.size());
@@ -60,7 +62,9 @@ TEST_F(FolderPresetManagerTest, SetsRoundTripThroughAFreshManager) {
   EXPECT_FALSE(fresh.DoesPresetNameExist(u"Body", u"Heading 1"));
 }
 
-TEST_F(FolderPresetManagerTest, DamagedFilesAreNeverOverwrittenByLoads) {
+// Damaged files and special files load as nothing and are never overwritten
+// by the editing operations; SetAsideDamagedSet moves them out of the way.
+TEST_F(FolderPresetManagerTest, DamagedSetsLoadAsNothingUntilSetAside) {
   FolderPresetManager manager(Folder());
   EXPECT_EQ(manager.GetPresetStyleSheet(u"Missing"), nullptr);
   const std::unique_ptr<Style> style(MakeStyle(u"source"));
@@ -71,17 +75,36 @@ TEST_F(FolderPresetManagerTest, DamagedFilesAreNeverOverwrittenByLoads) {
       R"({"presetTestParagraph": {"A": 5}})",                      // a style that is no object
       R"({"presetTestParagraph": {"A": {"size": "x"}, "B": {}}})", // a value that is refused
       std::string("\xff\xfe\x00{", 4),
+      "fifo", // a pipe, and a link to a device: never read
+      "/dev/zero",
   };
   for (const std::string& bytes : cases) {
     SCOPED_TRACE(bytes);
-    WriteFile("Damaged.qsty", bytes);
+    const bool special = bytes == "fifo" || bytes == "/dev/zero";
+    if (bytes == "fifo")
+      ASSERT_EQ(::mkfifo(FileOf("Damaged.qsty").c_str(), 0600), 0);
+    else if (bytes == "/dev/zero")
+      std::filesystem::create_symlink(bytes, FileOf("Damaged.qsty"));
+    else
+      WriteFile("Damaged.qsty", bytes);
     EXPECT_EQ(manager.GetPresetStyleSheet(u"Damaged"), nullptr);
     EXPECT_FALSE(manager.AddPreset(u"Damaged", u"A", style.get(), true));
     EXPECT_FALSE(manager.DeletePreset(u"Damaged", u"A"));
     EXPECT_EQ(manager.CreatePresetSet(u"Damaged"), nullptr);
-    EXPECT_EQ(manager.GetPresetSetNames(), Names{u"Damaged"});
-    EXPECT_EQ(ReadFile("Damaged.qsty"), bytes);
+    EXPECT_EQ(manager.GetPresetSetNames(), special ? Names{} : Names{u"Damaged"});
+
+    Text movedTo;
+    ASSERT_TRUE(manager.SetAsideDamagedSet(u"Damaged", &movedTo));
+    const std::string moved = std::filesystem::path(movedTo.GetStdString()).filename().string();
+    EXPECT_EQ(moved.rfind("Damaged.qsty.damaged-", 0), 0u);
+    EXPECT_EQ(special ? bytes : ReadFile(moved), bytes); // a pipe would block the read
+    EXPECT_TRUE(manager.GetPresetSetNames().empty());
+    EXPECT_NE(manager.CreatePresetSet(u"Damaged"), nullptr);
+    EXPECT_FALSE(manager.SetAsideDamagedSet(u"Damaged")); // it loads now
+    manager.ReloadPresetSets();
+    std::filesystem::remove(FileOf("Damaged.qsty"));
   }
+  EXPECT_EQ(Entries().size(), 1 + std::size(cases));
 }
 
 // A child process saves a large set over and over, flipping every preset

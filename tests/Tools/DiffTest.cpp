@@ -80,6 +80,15 @@ TEST_F(DiffTest, StylesMatchByNameAndReportWhatChanged) {
         "effective paragraph B character.bold: - > 0",
         "effective paragraph B character.italic: - > 1",
         "effective paragraph B character.tracking: - > 0"}},
+      {"a chain resolves through the nearest own value",
+       R"({"paragraph": {"A": {"spaceAfter": "1"}, "B": {"inherits": "A"},
+           "C": {"inherits": "B", "spaceAfter": "2"}, "D": {"inherits": "C"}, "E": {"inherits": "D"}}})",
+       R"({"paragraph": {"A": {"spaceAfter": "3"}, "B": {"inherits": "A"},
+           "C": {"inherits": "B"}, "D": {"inherits": "C"}, "E": {"inherits": "D"}}})",
+       true,
+       {"value paragraph A spaceAfter: 1 > 3", "effective paragraph B spaceAfter: 1 > 3",
+        "value paragraph C spaceAfter: 2 > -", "effective paragraph D spaceAfter: 2 > 3",
+        "effective paragraph E spaceAfter: 2 > 3"}},
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.name);
@@ -91,6 +100,23 @@ TEST_F(DiffTest, StylesMatchByNameAndReportWhatChanged) {
       lines.push_back(Line(d));
     EXPECT_EQ(lines, c.expected);
   }
+}
+
+// Each style's effective values cost its own properties, not its depth: a
+// chain of 200k styles, every one changed through the root, takes seconds
+// (a walk up the chain per style would take hours).
+TEST_F(DiffTest, EffectiveDiffOfALongChainIsLinear) {
+  constexpr int kStyles = 200000;
+  StyleSheet sheets[2];
+  for (int version = 0; version < 2; ++version) {
+    std::string text = R"({"paragraph": {"P0": {"spaceAfter": ")" + std::to_string(version) + "\"}";
+    for (int i = 1; i < kStyles; ++i)
+      text += ",\"P" + std::to_string(i) + R"(": {"inherits": "P)" + std::to_string(i - 1) + "\"}";
+    ASSERT_TRUE(sheets[version].ImportFromString(U16(text + "}}"), true));
+  }
+  const std::vector<Difference> differences = DiffSheets(sheets[0], sheets[1], true);
+  ASSERT_EQ(differences.size(), static_cast<std::size_t>(kStyles));
+  EXPECT_EQ(Line(differences.back()), "effective paragraph P99999 spaceAfter: 0 > 1");
 }
 
 } // namespace

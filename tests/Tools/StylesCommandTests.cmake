@@ -143,7 +143,15 @@ styles_command_test(PresetShow 0 preset show --folder ${presets} Headings "big h
   OUTPUT "spaceBefore +18 +own.*character.fontSize +16 +own")
 styles_command_test(PresetDelete 0 preset delete --folder ${presets} Headings "Big Heading")
 styles_command_test(PresetDeleteMissing 1 preset delete --folder ${presets} Headings "Big Heading")
-styles_command_test(PresetNoFolder 3 preset list --folder ${presets}/absent)
+styles_command_test(PresetNoFolder 3 preset list --folder ${presets}/absent
+  ERROR "absent: is not a folder: No such file or directory")
+string(REPEAT x 300 longName)
+styles_command_test(PresetLongSetName 3 preset add --folder ${CMAKE_CURRENT_BINARY_DIR} ${longName} ${STYLES_SAMPLE} Emphasis
+  ERROR "cannot create the preset set \"x+\": File name too long")
+add_test(NAME StylesCommand.PresetFiles
+  COMMAND ${CMAKE_COMMAND} -DPROGRAM=$<TARGET_FILE:styles> -DSAMPLE=${STYLES_SAMPLE}
+    -DWORK_DIR=${CMAKE_CURRENT_BINARY_DIR}/PresetFiles -P ${CMAKE_CURRENT_SOURCE_DIR}/Tools/PresetFiles.cmake)
+set_tests_properties(StylesCommand.PresetFiles PROPERTIES SKIP_REGULAR_EXPRESSION "SKIPPED:")
 set_tests_properties(StylesCommand.PresetAddAgain PROPERTIES DEPENDS StylesCommand.PresetAdd)
 set_tests_properties(StylesCommand.PresetList PROPERTIES DEPENDS StylesCommand.PresetAddAgain)
 set_tests_properties(StylesCommand.PresetShow PROPERTIES DEPENDS StylesCommand.PresetList)

@@ -14,6 +14,7 @@
 
 #include <Json/Json.h>
 #include <SystemIO/AtomicFile.h>
+#include <SystemIO/FileSystem.h>
 #include <SystemIO/Path.h>
 #include <ZelUtils/Stream.h>
 #include <ZelUtils/TextStream.h>
@@ -61,15 +62,6 @@ bool IsStandardOutput(const std::string& path) {
 // How a command takes what reading a document cannot keep: a read-only one
 // ignores it, a rewriting one refuses it or (with --lossy) warns.
 enum class Loss { Ignore, Refuse, Accept };
-
-// The text of `path` for the preset commands; false when it cannot be read.
-bool ReadText(const std::string& path, Text& text) {
-  std::string bytes, reason;
-  if (!ReadBytes(path, bytes, reason))
-    return false;
-  text = DecodeUtf8(std::move(bytes));
-  return true;
-}
 
 // Reads a document's text; `diagnostics` gets an error for bytes that are not
 // UTF-8 (they are read as U+FFFD).
@@ -166,37 +158,68 @@ const Style* FindStyle(const StyleSheet& sheet, const std::string& document,
   return style;
 }
 
-// Checks the folder and the set name of a preset command.
-int CheckPresetArguments(const std::string& folder, const std::string& set) {
+// Checks the folder and the set name of a preset command; `set` may be empty
+// only where the command takes no set.
+int CheckPresetArguments(const std::string& folder, const std::string& set, bool setRequired) {
   std::error_code error;
   if (!std::filesystem::is_directory(folder, error)) {
-    Output::Error(folder, "is not a folder");
+    if (!error && std::filesystem::exists(folder, error))
+      error = std::make_error_code(std::errc::not_a_directory);
+    Output::Error(folder, "is not a folder: " + error.message());
     return kUnreadable;
   }
-  if (!set.empty() && !Styles::StylePresetManager::IsValidSetName(FromUtf8(set))) {
-    Output::Error(set, "cannot name a preset set");
+  if ((setRequired || !set.empty()) && !Styles::StylePresetManager::IsValidSetName(FromUtf8(set))) {
+    Output::Error(set, set.empty() ? "a preset set needs a name" : "cannot name a preset set");
     return kUsage;
   }
   return kSuccess;
 }
 
+// The line that tells how to get past a set file that does not load.
+void SuggestRecovery(const std::string& folder, const std::string& set) {
+  Output::Error("", "\"styles preset recover --folder " + folder + " " + set +
+                        "\" moves the file aside and starts the set afresh");
+}
+
 // CheckPresetArguments, then the set's file: the preset manager loads sets
-// with a plain import, so a damaged file is caught here and reported instead
-// of half read.
+// with a plain import, so a damaged or unreadable file is caught here and
+// reported instead of half read or taken for a missing set.
 int CheckPresetSet(const std::string& folder, const std::string& set) {
-  if (const int status = CheckPresetArguments(folder, set))
+  if (const int status = CheckPresetArguments(folder, set, true))
     return status;
-  const std::string path =
-      ToUtf8(SystemIO::Path::Combine(FromUtf8(folder), FromUtf8(set + ".qsty")));
-  Text text;
-  if (!ReadText(path, text) || Text(text).Trim().IsEmpty())
-    return kSuccess; // no set, or one saved without a sheet
+  const Text path = SystemIO::Path::Combine(FromUtf8(folder), FromUtf8(set + ".qsty"));
+  std::string bytes, reason;
+  if (!SystemIO::File::ReadRegular(path, Styles::FolderPresetManager::kMaxSetFileBytes, bytes,
+                                   &reason)) {
+    if (!SystemIO::File::Exists(path))
+      return kSuccess; // no set yet
+    Output::Error(ToUtf8(path), "cannot be read: " + reason);
+    SuggestRecovery(folder, set);
+    return kUnreadable;
+  }
+  const Text text = ZelUtils::TextStreamReader(ZelUtils::MemoryStream::FromBytes(std::move(bytes)),
+                                               ZelUtils::TextStream::UTF8)
+                        .ReadToEnd();
+  if (Text(text).Trim().IsEmpty())
+    return kSuccess; // saved without a sheet
   const std::vector<Diagnostic> diagnostics = Styles::Tools::ValidateDocument(text);
   if (Styles::Tools::HasErrors(diagnostics)) {
-    Output::DocumentErrors(path, diagnostics);
+    Output::DocumentErrors(ToUtf8(path), diagnostics);
+    SuggestRecovery(folder, set);
     return kUnusable;
   }
   return kSuccess;
+}
+
+// Saves the set after an edit: the manager's own save may have counted a
+// file it could not make as success.
+int SavePresetSet(Styles::FolderPresetManager& presets, const std::string& folder,
+                  const std::string& set) {
+  if (presets.Save(FromUtf8(set)) && !presets.LastSaveFailed())
+    return kSuccess;
+  Output::Error(folder,
+                "cannot save the preset set \"" + set + "\": " + presets.GetLastSaveError());
+  return kUnreadable;
 }
 
 } // namespace
@@ -355,7 +378,7 @@ int Graph(const CommonOptions&, const std::string& document) {
 }
 
 int PresetList(const CommonOptions& options, const std::string& folder, const std::string& set) {
-  if (const int status = CheckPresetArguments(folder, set))
+  if (const int status = CheckPresetArguments(folder, set, false))
     return status;
   Styles::FolderPresetManager presets(FromUtf8(folder));
   if (set.empty()) {
@@ -402,7 +425,9 @@ int PresetAdd(const CommonOptions& options, const std::string& folder, const std
   const Text presetName = FromUtf8(name.empty() ? styleName : name);
   Styles::FolderPresetManager presets(FromUtf8(folder));
   if (!presets.GetPresetStyleSheet(setName) && !presets.CreatePresetSet(setName)) {
-    Output::Error(folder, "cannot create the preset set \"" + set + "\"");
+    const std::string& reason = presets.GetLastSaveError();
+    Output::Error(folder, "cannot create the preset set \"" + set + "\"" +
+                              (reason.empty() ? std::string() : ": " + reason));
     return kUnreadable;
   }
   if (!replace && presets.DoesPresetNameExist(setName, presetName)) {
@@ -411,6 +436,8 @@ int PresetAdd(const CommonOptions& options, const std::string& folder, const std
     return kNegative;
   }
   presets.AddPreset(setName, presetName, style, replace);
+  if (const int status = SavePresetSet(presets, folder, set))
+    return status;
   Output(options.json)
       .Message("added preset \"" + ToUtf8(presetName) + "\" to set \"" + set + "\"");
   return kSuccess;
@@ -426,7 +453,39 @@ int PresetDelete(const CommonOptions& options, const std::string& folder, const 
     return kNegative;
   }
   presets.DeletePreset(FromUtf8(set), FromUtf8(name));
+  if (const int status = SavePresetSet(presets, folder, set))
+    return status;
   Output(options.json).Message("deleted preset \"" + name + "\" from set \"" + set + "\"");
+  return kSuccess;
+}
+
+int PresetRecover(const CommonOptions& options, const std::string& folder, const std::string& set) {
+  if (const int status = CheckPresetArguments(folder, set, true))
+    return status;
+  Styles::FolderPresetManager presets(FromUtf8(folder));
+  const Text setName = FromUtf8(set);
+  if (presets.GetPresetStyleSheet(setName)) {
+    Output::Error(folder, "the preset set \"" + set + "\" loads; nothing to recover");
+    return kNegative;
+  }
+  const Text path = SystemIO::Path::Combine(FromUtf8(folder), presets.GetFileName(setName));
+  Text movedTo;
+  if (!presets.SetAsideDamagedSet(setName, &movedTo)) {
+    if (!SystemIO::File::Exists(path)) {
+      Output::Error(folder, "no preset set \"" + set + "\"");
+      return kNegative;
+    }
+    Output::Error(ToUtf8(path), "cannot be moved aside");
+    return kUnreadable;
+  }
+  if (!presets.CreatePresetSet(setName)) {
+    Output::Error(folder, "moved the damaged set file to " + ToUtf8(movedTo) +
+                              ", but cannot start the set afresh: " + presets.GetLastSaveError());
+    return kUnreadable;
+  }
+  Output(options.json)
+      .Message("moved the damaged set file to " + ToUtf8(movedTo) + "; the preset set \"" + set +
+               "\" starts afresh");
   return kSuccess;
 }
 

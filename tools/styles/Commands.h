@@ -62,5 +62,7 @@ int PresetAdd(const CommonOptions& options, const std::string& folder, const std
               bool replace);
 int PresetDelete(const CommonOptions& options, const std::string& folder, const std::string& set,
                  const std::string& name);
+// Moves a set file that does not load aside and starts the set afresh.
+int PresetRecover(const CommonOptions& options, const std::string& folder, const std::string& set);
 
 } // namespace StylesCommand

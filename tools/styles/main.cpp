@@ -145,10 +145,12 @@ int main(int argc, char** argv) {
   CLI::App* presetShow = preset->add_subcommand("show", "Print a preset's values");
   CLI::App* presetAdd = preset->add_subcommand("add", "Add a document's style as a preset");
   CLI::App* presetDelete = preset->add_subcommand("delete", "Delete a preset");
-  for (CLI::App* command : {presetList, presetShow, presetAdd, presetDelete})
+  CLI::App* presetRecover =
+      preset->add_subcommand("recover", "Move a damaged set file aside and start the set afresh");
+  for (CLI::App* command : {presetList, presetShow, presetAdd, presetDelete, presetRecover})
     command->add_option("--folder", folder, "Folder of the preset files")->required();
   presetList->add_option("set", set, "Preset set");
-  for (CLI::App* command : {presetShow, presetAdd, presetDelete})
+  for (CLI::App* command : {presetShow, presetAdd, presetDelete, presetRecover})
     command->add_option("set", set, "Preset set")->required();
   presetShow->add_option("name", name, "Preset name")->required();
   presetDelete->add_option("name", name, "Preset name")->required();
@@ -158,7 +160,7 @@ int main(int argc, char** argv) {
   presetAdd->add_flag("--replace", replace, "Replace a preset of that name");
 
   for (CLI::App* command : {validate, list, show, flatten, diff, format, report, graph, presetList,
-                            presetShow, presetAdd, presetDelete})
+                            presetShow, presetAdd, presetDelete, presetRecover})
     AddCommonOptions(*command, options);
 
   int status = kSuccess;
@@ -217,6 +219,8 @@ int main(int argc, char** argv) {
       status = PresetAdd(options, folder, set, document, style, name, replace);
     else if (presetDelete->parsed())
       status = PresetDelete(options, folder, set, name);
+    else if (presetRecover->parsed())
+      status = PresetRecover(options, folder, set);
   } catch (const std::exception& error) {
     // Lookups can still fail on sheets the checks let through; say so
     // rather than end abruptly.

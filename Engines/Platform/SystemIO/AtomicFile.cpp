@@ -77,8 +77,8 @@ bool IsStaleTemporaryName(const std::string& name) {
   unsigned long long pid = 0, startTime = 0;
   int length = 0;
   if (name.compare(0, sizeof k_strTemporaryPrefix - 1, k_strTemporaryPrefix) != 0 ||
-      std::sscanf(name.c_str() + sizeof k_strTemporaryPrefix - 1, "%llu-%llu-%*16[0-9a-f]%n",
-                  &pid, &startTime, &length) != 2 ||
+      std::sscanf(name.c_str() + sizeof k_strTemporaryPrefix - 1, "%llu-%llu-%*16[0-9a-f]%n", &pid,
+                  &startTime, &length) != 2 ||
       name.size() != sizeof k_strTemporaryPrefix - 1 + static_cast<std::size_t>(length) ||
       pid == 0 || pid > 0x7fffffffULL)
     return false;
@@ -105,7 +105,7 @@ bool ResolveTarget(const std::string& path, std::string& target, struct stat& ex
     return errno == ENOENT || errno == ENAMETOOLONG ? true : FailWithErrno(error);
   if (S_ISLNK(existing.st_mode)) {
     const std::unique_ptr<char, void (*)(void*)> resolved(::realpath(path.c_str(), nullptr),
-                                                         &std::free);
+                                                          &std::free);
     if (!resolved)
       return errno == ENOENT ? Fail(error, "symbolic link to a missing file")
                              : FailWithErrno(error);

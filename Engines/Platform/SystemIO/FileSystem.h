@@ -1,28 +1,35 @@
 /// @file
 /// SystemIO::File and SystemIO::Directory: the few file-system operations that
-/// crash-safe saving needs (replacing a file in one step, removing a file) and
-/// the listing of a folder. Paths are UTF-16 text, as in SystemIO::Path.
+/// preset folders need (guarded reading, moving a file aside)
+/// and the listing of a folder. Paths are UTF-16 text, as in SystemIO::Path.
 #pragma once
 
 #include <ZelPlatform/Export.h>
 #include <ZelPlatform/ZelString.h>
 
+#include <cstddef>
+#include <string>
 #include <vector>
 
 namespace SystemIO {
 
 /// Operations on single files.
 struct ZEL_API File {
-  /// Renames `source` to `target`, replacing a file already called `target`
-  /// in one step: at every instant `target` names either the old file or the
-  /// new one. Both must lie in one folder (one file system at least). Then
-  /// flushes the folder so that the rename survives a system crash (best
-  /// effort). False, with nothing changed, when the rename fails: a path that
-  /// cannot name a file, a missing `source`, a `target` that is a folder.
-  static bool Replace(const ZelStringT<char16_t>& source, const ZelStringT<char16_t>& target);
-  /// Removes the file `path` (a link itself, not what it points to). False
-  /// when there is no such file, it is a folder, or it cannot be removed.
-  static bool Remove(const ZelStringT<char16_t>& path);
+  /// Renames `source` to `target` inside one file system, never replacing
+  /// anything: false, with nothing changed, when `target` exists (a dangling
+  /// link included), `source` is missing, or a path cannot name a file.
+  static bool MoveAside(const ZelStringT<char16_t>& source, const ZelStringT<char16_t>& target);
+  /// Whether anything is called `path`: a file, a folder, a link (even one
+  /// that leads nowhere).
+  static bool Exists(const ZelStringT<char16_t>& path);
+  /// Reads the whole of `path` into `bytes` when it is a regular file (or a
+  /// link to one) of at most `maxBytes` bytes. The check is made on the opened
+  /// file, so a file swapped in after a check cannot be read by mistake; pipes,
+  /// devices and folders are refused without reading a byte or waiting. False,
+  /// with `bytes` empty and the reason (strerror-style text) in `error`, when
+  /// the file is missing, refused, too large or cannot be read.
+  static bool ReadRegular(const ZelStringT<char16_t>& path, std::size_t maxBytes,
+                          std::string& bytes, std::string* error = nullptr);
 };
 
 /// Operations on folders.

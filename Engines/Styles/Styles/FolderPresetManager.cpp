@@ -2,30 +2,47 @@
 
 #include <Styles/StyleSheet.h>
 
+#include <SystemIO/AtomicFile.h>
 #include <SystemIO/FileSystem.h>
 #include <SystemIO/Path.h>
 #include <ZelUtils/Stream.h>
 
 #include <algorithm>
+#include <ctime>
 #include <memory>
 #include <new>
+#include <string>
 #include <utility>
 
 namespace Styles {
 
 namespace {
 
-// Whether `path` is a file holding at least one byte.
+// Whether `path` names anything but a missing or empty regular file: what a
+// new set must never replace.
 bool HasContent(const ZelStringT<char16_t>& path) {
-  ZelUtils::Stream stream = ZelUtils::FileStream::Open(path);
-  char byte;
-  return stream.Read(&byte, 1) == 1;
+  std::string bytes;
+  return SystemIO::File::Exists(path) && !SystemIO::File::ReadRegular(path, 0, bytes);
+}
+
+// "YYYYMMDDTHHMMSSZ" for the present moment.
+std::string UtcTimeStamp() {
+  const std::time_t now = std::time(nullptr);
+  std::tm parts{};
+  char text[32] = "unknown-time";
+  if (::gmtime_r(&now, &parts))
+    std::strftime(text, sizeof text, "%Y%m%dT%H%M%SZ", &parts);
+  return text;
 }
 
 } // namespace
 
 FolderPresetManager::FolderPresetManager(ZelStringT<char16_t> folder)
-    : m_folder(std::move(folder)) {}
+    : m_folder(std::move(folder)) {
+  // What saves killed before finishing left behind goes at once.
+  if (!m_folder.IsEmpty())
+    SystemIO::RemoveStaleTemporaryFiles(ZelPlatform::Utf16ToUtf8(m_folder.GetView()));
+}
 
 FolderPresetManager::~FolderPresetManager() = default;
 
@@ -72,10 +89,11 @@ StyleSheet* FolderPresetManager::GetPresetStyleSheet(const SetName& setName) con
   const auto loaded = m_sheets.find(setName);
   if (loaded != m_sheets.end() && loaded->second)
     return loaded->second;
-  ZelUtils::Stream stream =
-      ZelUtils::FileStream::Open(SystemIO::Path::Combine(m_folder, GetFileName(setName)));
-  if (!stream)
+  std::string bytes;
+  if (!SystemIO::File::ReadRegular(SystemIO::Path::Combine(m_folder, GetFileName(setName)),
+                                   kMaxSetFileBytes, bytes))
     return nullptr;
+  ZelUtils::Stream stream = ZelUtils::MemoryStream::FromBytes(std::move(bytes));
   std::unique_ptr<StyleSheet> sheet(new StyleSheet);
   try {
     if (!sheet->Import(stream, true))
@@ -100,5 +118,36 @@ void FolderPresetManager::ReloadPresetSets() {
 }
 
 ZelStringT<char16_t> FolderPresetManager::GetPresetFolder() const { return m_folder; }
+
+bool FolderPresetManager::SetAsideDamagedSet(const SetName& setName,
+                                             ZelStringT<char16_t>* movedTo) {
+  if (!IsValidSetName(setName) || GetPresetStyleSheet(setName))
+    return false;
+  const ZelStringT<char16_t> path = SystemIO::Path::Combine(m_folder, GetFileName(setName));
+  if (!HasContent(path))
+    return false;
+  const ZelStringT<char16_t> aside =
+      path + u".damaged-" + ZelStringT<char16_t>(ZelPlatform::Utf8ToUtf16(UtcTimeStamp()));
+  for (int attempt = 1; attempt < 100; ++attempt) {
+    const ZelStringT<char16_t> target =
+        attempt == 1 ? aside
+                     : aside + u"-" +
+                           ZelStringT<char16_t>(ZelPlatform::Utf8ToUtf16(std::to_string(attempt)));
+    if (SystemIO::File::MoveAside(path, target)) {
+      if (movedTo)
+        *movedTo = target;
+      return true;
+    }
+    if (!SystemIO::File::Exists(target))
+      return false;
+  }
+  return false;
+}
+
+bool FolderPresetManager::LastSaveFailed() const noexcept { return !m_lastSaveError.empty(); }
+
+const std::string& FolderPresetManager::GetLastSaveError() const noexcept {
+  return m_lastSaveError;
+}
 
 } // namespace Styles

@@ -9,6 +9,8 @@
 
 #include <ZelPlatform/ZelString.h>
 
+#include <cstddef>
+#include <string>
 #include <vector>
 
 namespace Styles {
@@ -16,7 +18,12 @@ namespace Styles {
 /// A preset manager whose sets are the preset files of one folder.
 class STYLES_API FolderPresetManager : public StylePresetManager {
 public:
-  /// Keeps the sets in `folder`, which must exist; nothing is read yet.
+  /// The largest set file that is read, in bytes (32 MiB); a larger one does
+  /// not load, as a damaged one.
+  static constexpr std::size_t kMaxSetFileBytes = std::size_t{32} << 20;
+
+  /// Keeps the sets in `folder`, which must exist; no set is read yet. Removes
+  /// the temporary files that saves killed before finishing left there.
   explicit FolderPresetManager(ZelStringT<char16_t> folder);
   ~FolderPresetManager() override;
 
@@ -30,13 +37,30 @@ public:
   /// cannot be written. The sheet is owned by the manager.
   StyleSheet* CreatePresetSet(const SetName& setName) override;
   /// The set's sheet, read from its file on first request and then kept; the
-  /// manager owns it. Null for an invalid name, or a file that is missing or
-  /// does not hold a readable document; nothing is kept then, and the file
-  /// is left untouched.
+  /// manager owns it. Null for an invalid name, or a file that is missing, not
+  /// a regular file (pipes and devices are never read, links to them neither),
+  /// larger than kMaxSetFileBytes or not a readable document; nothing is kept
+  /// then, and the file is left untouched.
   StyleSheet* GetPresetStyleSheet(const SetName& setName) const override;
   /// Destroys every loaded sheet, with the presets handed out from it.
   void ReloadPresetSets() override;
   ZelStringT<char16_t> GetPresetFolder() const override;
+
+  /// Moves the file of a set that does not load (damaged, refused or
+  /// unreadable) aside to "<set>.qsty.damaged-<UTC time>" (with "-2", "-3"...
+  /// when taken), so that CreatePresetSet can start the set afresh; the moved
+  /// file is never listed as a set. True when it was moved, with its new path
+  /// in `movedTo` when given; false for an invalid name, a set that loads, no
+  /// file, or a move that fails.
+  bool SetAsideDamagedSet(const SetName& setName, ZelStringT<char16_t>* movedTo = nullptr);
+
+  /// Whether the last Save (also the one inside AddPreset, DeletePreset or
+  /// CreatePresetSet) left the set's file unwritten, even when it reported
+  /// success (Save counts a file that cannot be made as success).
+  bool LastSaveFailed() const noexcept;
+  /// Why the last Save failed, strerror-style ("Permission denied", "No space
+  /// left on device"); empty after a save that wrote the file.
+  const std::string& GetLastSaveError() const noexcept;
 
 private:
   ZelStringT<char16_t> m_folder;

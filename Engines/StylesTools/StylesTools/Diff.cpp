@@ -83,13 +83,15 @@ public:
     }
   }
 
-  void Effective(const Style& a, const Style& b) {
+  // The caches, one per sheet, outlive the pair: a chain's styles share what
+  // their ancestors resolved.
+  void Effective(const Style& a, const Style& b, ResolutionCache& cacheA, ResolutionCache& cacheB) {
     std::set<Text> reported;
     for (std::size_t i = m_first; i < m_out.size(); ++i)
       if (m_out[i].kind == Kind::ValueChanged)
         reported.insert(m_out[i].path);
-    const std::vector<EffectiveValue> valuesA = ListEffectiveValues(a);
-    const std::vector<EffectiveValue> valuesB = ListEffectiveValues(b);
+    const std::vector<EffectiveValue> valuesA = ListEffectiveValues(a, cacheA);
+    const std::vector<EffectiveValue> valuesB = ListEffectiveValues(b, cacheB);
     std::unordered_map<std::u16string, const EffectiveValue*> byPath;
     for (const EffectiveValue& value : valuesA)
       byPath.emplace(value.path.GetStdString(), &value);
@@ -167,6 +169,7 @@ std::vector<Difference> DiffSheets(const StyleSheet& oldSheet, const StyleSheet&
       categories.emplace(entry.first.GetString(), entry.first);
 
   std::vector<Difference> out;
+  ResolutionCache oldCache, newCache;
   static const StyleSheet::NameIndex kEmpty;
   for (const auto& [text, category] : categories) {
     const auto oldFound = oldStyles.find(category);
@@ -191,7 +194,7 @@ std::vector<Difference> DiffSheets(const StyleSheet& oldSheet, const StyleSheet&
         StylePairDiff pair(oldSheet, newSheet, category, itB->first, out);
         pair.Own(itA->second, itB->second, Text());
         if (effective && itA->second && itB->second)
-          pair.Effective(*itA->second, *itB->second);
+          pair.Effective(*itA->second, *itB->second, oldCache, newCache);
         ++itA;
         ++itB;
       }

@@ -13,6 +13,7 @@
 #include <memory>
 #include <string>
 #include <typeinfo>
+#include <vector>
 
 namespace Styles {
 namespace Tools {
@@ -29,12 +30,20 @@ Resolution DefaultOf(const StyleCategory* category, const PropertyKey& key, cons
                     owner};
 }
 
+// The effective value of `key`, as Style::GetProperty gives it; through the
+// cache when there is one.
+const ZelUtils::Any& EffectiveOf(const Style& style, const PropertyKey& key,
+                                 ResolutionCache* cache) {
+  return cache ? *cache->Resolve(style, key).value : style.GetProperty(key);
+}
+
 // Descends from `start` along `keys`, last key first, through effective
 // values that must hold substyles; null when one of them is null.
-const Style* Descend(const Style* start, const std::vector<PropertyKey>& keys) {
+const Style* Descend(const Style* start, const std::vector<PropertyKey>& keys,
+                     ResolutionCache* cache) {
   const Style* counterpart = start;
   for (std::size_t i = keys.size(); i-- > 0 && counterpart;) {
-    const ZelUtils::Any& value = counterpart->GetProperty(keys[i]);
+    const ZelUtils::Any& value = EffectiveOf(*counterpart, keys[i], cache);
     if (!value.IsTypeCompatible<Style*>())
       throw std::bad_cast();
     counterpart = value.Get<Style*>();
@@ -45,7 +54,7 @@ const Style* Descend(const Style* start, const std::vector<PropertyKey>& keys) {
 // The search of Style::GetInheritedProperty from `current`, which has no own
 // value to look at; `source` is what a value found on a parent counts as.
 Resolution Inherit(const Style* current, const PropertyKey& key, ValueSource source,
-                   const Style* owner) {
+                   const Style* owner, ResolutionCache* cache) {
   std::vector<PropertyKey> keys;
   for (;;) {
     while (const Style* parent = current->GetParent()) {
@@ -71,7 +80,7 @@ Resolution Inherit(const Style* current, const PropertyKey& key, ValueSource sou
     }
     if (!ownerWithParent)
       return DefaultOf(current->GetCategory().get(), key, owner);
-    const Style* counterpart = Descend(ownerWithParent->GetParent(), keys);
+    const Style* counterpart = Descend(ownerWithParent->GetParent(), keys, cache);
     if (!counterpart)
       return DefaultOf(current->GetCategory().get(), key, owner);
     if (!owner)
@@ -87,7 +96,8 @@ Resolution Inherit(const Style* current, const PropertyKey& key, ValueSource sou
 // end of `virtualKeys` (outermost first), of `category`: the substyle that
 // flattening makes where the style only inherits one.
 Resolution ResolveVirtual(const Style& anchor, const std::vector<PropertyKey>& virtualKeys,
-                          const StyleCategory* category, const PropertyKey& key) {
+                          const StyleCategory* category, const PropertyKey& key,
+                          ResolutionCache* cache) {
   std::vector<PropertyKey> keys(virtualKeys.rbegin(), virtualKeys.rend());
   const Style* climber = &anchor;
   const Style* ownerWithParent = anchor.GetParent() ? &anchor : nullptr;
@@ -99,12 +109,12 @@ Resolution ResolveVirtual(const Style& anchor, const std::vector<PropertyKey>& v
   }
   if (!ownerWithParent)
     return DefaultOf(category, key, nullptr);
-  const Style* counterpart = Descend(ownerWithParent->GetParent(), keys);
+  const Style* counterpart = Descend(ownerWithParent->GetParent(), keys, cache);
   if (!counterpart)
     return DefaultOf(category, key, nullptr);
   if (const ZelUtils::Any* own = counterpart->GetProperties().Find(key))
     return Resolution{own, ValueSource::Owner, counterpart, nullptr, ownerWithParent};
-  return Inherit(counterpart, key, ValueSource::Owner, ownerWithParent);
+  return Inherit(counterpart, key, ValueSource::Owner, ownerWithParent, cache);
 }
 
 const StyleCategory* ElementCategory(const BaseStyleProperty& behaviour) {
@@ -114,7 +124,7 @@ const StyleCategory* ElementCategory(const BaseStyleProperty& behaviour) {
 }
 
 void ListValues(const Style& anchor, std::vector<PropertyKey>& virtualKeys,
-                const StyleCategory* category, const Text& prefix,
+                const StyleCategory* category, const Text& prefix, ResolutionCache& cache,
                 std::vector<EffectiveValue>& out) {
   if (!category)
     return;
@@ -124,13 +134,13 @@ void ListValues(const Style& anchor, std::vector<PropertyKey>& virtualKeys,
       continue;
     const Text path = prefix + key.GetString();
     const Resolution resolution = virtualKeys.empty()
-                                      ? ResolveProperty(anchor, key)
-                                      : ResolveVirtual(anchor, virtualKeys, category, key);
+                                      ? cache.Resolve(anchor, key)
+                                      : ResolveVirtual(anchor, virtualKeys, category, key, &cache);
     if (behaviour->IsSubstyle()) {
       const Style* own = virtualKeys.empty() ? anchor.GetSubstyle(key, false) : nullptr;
       if (own) {
         std::vector<PropertyKey> none;
-        ListValues(*own, none, own->GetCategory().get(), path + u".", out);
+        ListValues(*own, none, own->GetCategory().get(), path + u".", cache, out);
         continue;
       }
       // Flattening asks for the effective substyle, which must be one.
@@ -139,7 +149,7 @@ void ListValues(const Style& anchor, std::vector<PropertyKey>& virtualKeys,
       if (!resolution.value->Get<Style*>())
         continue;
       virtualKeys.push_back(key);
-      ListValues(anchor, virtualKeys, ElementCategory(*behaviour), path + u".", out);
+      ListValues(anchor, virtualKeys, ElementCategory(*behaviour), path + u".", cache, out);
       virtualKeys.pop_back();
       continue;
     }
@@ -153,7 +163,7 @@ void ListValues(const Style& anchor, std::vector<PropertyKey>& virtualKeys,
         continue;
       std::vector<PropertyKey> none;
       ListValues(*element, none, element->GetCategory().get(),
-                 path + u"[" + Widen(std::to_string(i)) + u"].", out);
+                 path + u"[" + Widen(std::to_string(i)) + u"].", cache, out);
     }
   }
 }
@@ -163,7 +173,46 @@ void ListValues(const Style& anchor, std::vector<PropertyKey>& virtualKeys,
 Resolution ResolveProperty(const Style& style, const PropertyKey& key) {
   if (const ZelUtils::Any* own = style.GetProperties().Find(key))
     return Resolution{own, ValueSource::Own, &style, nullptr, nullptr};
-  return Inherit(&style, key, ValueSource::Ancestor, nullptr);
+  return Inherit(&style, key, ValueSource::Ancestor, nullptr, nullptr);
+}
+
+std::size_t ResolutionCache::EntryHash::operator()(const Entry& entry) const noexcept {
+  return std::hash<const void*>()(entry.first) * 31 + std::hash<PropertyKey>()(entry.second);
+}
+
+ResolutionCache::ResolutionCache() = default;
+ResolutionCache::~ResolutionCache() = default;
+
+// A style without an own value resolves as its parent does when the parent
+// has none either, so a chain of such styles shares one result: each style is
+// climbed once per key, however many descendants ask.
+Resolution ResolutionCache::Resolve(const Style& style, const PropertyKey& key) {
+  if (const ZelUtils::Any* own = style.GetProperties().Find(key))
+    return Resolution{own, ValueSource::Own, &style, nullptr, nullptr};
+  std::vector<const Style*> pending{&style};
+  Resolution result;
+  for (;;) {
+    const Style* current = pending.back();
+    const auto cached = m_resolutions.find(Entry(current, key));
+    if (cached != m_resolutions.end()) {
+      result = cached->second;
+      pending.pop_back();
+      break;
+    }
+    const Style* parent = current->GetParent();
+    if (!parent) {
+      result = Inherit(current, key, ValueSource::Ancestor, nullptr, this);
+      break;
+    }
+    if (const ZelUtils::Any* own = parent->GetProperties().Find(key)) {
+      result = Resolution{own, ValueSource::Ancestor, parent, nullptr, nullptr};
+      break;
+    }
+    pending.push_back(parent);
+  }
+  for (const Style* waiting : pending)
+    m_resolutions.emplace(Entry(waiting, key), result);
+  return result;
 }
 
 Resolution ResolvePathProperty(const Style& style, const PropertyPath& path) {
@@ -191,9 +240,14 @@ Resolution ResolvePathProperty(const Style& style, const PropertyPath& path) {
 }
 
 std::vector<EffectiveValue> ListEffectiveValues(const Style& style) {
+  ResolutionCache cache;
+  return ListEffectiveValues(style, cache);
+}
+
+std::vector<EffectiveValue> ListEffectiveValues(const Style& style, ResolutionCache& cache) {
   std::vector<EffectiveValue> values;
   std::vector<PropertyKey> virtualKeys;
-  ListValues(style, virtualKeys, style.GetCategory().get(), Text(), values);
+  ListValues(style, virtualKeys, style.GetCategory().get(), Text(), cache, values);
   return values;
 }
 

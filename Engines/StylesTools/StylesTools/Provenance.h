@@ -13,6 +13,9 @@
 #include <ZelPlatform/ZelString.h>
 #include <ZelUtils/Any.h>
 
+#include <cstddef>
+#include <unordered_map>
+#include <utility>
 #include <vector>
 
 namespace Styles {
@@ -75,6 +78,30 @@ struct STYLES_TOOLS_API EffectiveValue {
   bool isList = false;
 };
 
+/// Remembers resolutions so that resolving the same keys on many styles of
+/// one sheet costs each style once, not once per descendant: listing the
+/// effective values of every style of a chain is then linear in its length.
+/// Results equal ResolveProperty's. The styles must not change, nor be
+/// destroyed, while the cache is in use.
+class STYLES_TOOLS_API ResolutionCache {
+public:
+  ResolutionCache();
+  ~ResolutionCache();
+  ResolutionCache(const ResolutionCache&) = delete;
+  ResolutionCache& operator=(const ResolutionCache&) = delete;
+
+  /// ResolveProperty(style, key), remembered for `style` and the ancestors
+  /// it climbs through. Throws what ResolveProperty throws.
+  Resolution Resolve(const Style& style, const PropertyKey& key);
+
+private:
+  using Entry = std::pair<const Style*, PropertyKey>;
+  struct EntryHash {
+    std::size_t operator()(const Entry& entry) const noexcept;
+  };
+  std::unordered_map<Entry, Resolution, EntryHash> m_resolutions;
+};
+
 /// Every effective value of `style`, in the registration order of each
 /// category: what the style's flattened copy (Style::CreateFlattenedStyle)
 /// holds. A substyle the style inherits but does not own is resolved as the
@@ -82,6 +109,10 @@ struct STYLES_TOOLS_API EffectiveValue {
 /// substyle property with no effective substyle lists nothing. Throws what
 /// lookups throw.
 STYLES_TOOLS_API std::vector<EffectiveValue> ListEffectiveValues(const Style& style);
+/// ListEffectiveValues(style), resolving through `cache` (see ResolutionCache):
+/// the way to list the values of many styles of one sheet.
+STYLES_TOOLS_API std::vector<EffectiveValue> ListEffectiveValues(const Style& style,
+                                                                 ResolutionCache& cache);
 
 /// The text of a value: a plain value through the behaviour's conversion
 /// policy, a list of substyles as its length; empty when there is no text form.

@@ -53,11 +53,10 @@ TEST_F(AtomicFileTest, WritesRegularFilesAndRefusesTheRest) {
     const char* reason; // null: written
     const char* holder; // the file that receives the bytes
   };
-  for (const Case& c : {Case{"new", nullptr, "new"}, Case{"old", nullptr, "old"},
-                        Case{"link", nullptr, "old"}, Case{"dangling", "missing", nullptr},
-                        Case{"sub", "not a regular file", nullptr},
-                        Case{"fifo", "not a regular file", nullptr},
-                        Case{"absent/x", "No such file", nullptr}}) {
+  for (const Case& c :
+       {Case{"new", nullptr, "new"}, Case{"old", nullptr, "old"}, Case{"link", nullptr, "old"},
+        Case{"dangling", "missing", nullptr}, Case{"sub", "not a regular file", nullptr},
+        Case{"fifo", "not a regular file", nullptr}, Case{"absent/x", "No such file", nullptr}}) {
     SCOPED_TRACE(c.name);
     SetUp();
     std::string error;
@@ -78,22 +77,6 @@ TEST_F(AtomicFileTest, WritesRegularFilesAndRefusesTheRest) {
   }
 }
 
-// A started file never shows in the folder and vanishes when not committed.
-TEST_F(AtomicFileTest, UncommittedFilesLeaveNothing) {
-  {
-    SystemIO::AtomicFile file;
-    ASSERT_TRUE(file.Open((m_folder / "old").string()));
-    ASSERT_TRUE(file.Write("partial"));
-    EXPECT_EQ(Names(), m_initial);
-  }
-  EXPECT_EQ(Read("old"), "old");
-  EXPECT_EQ(Names(), m_initial);
-  SystemIO::AtomicFile closed;
-  std::string error;
-  EXPECT_FALSE(closed.Write("x", &error) || closed.Commit(&error));
-  EXPECT_FALSE(error.empty());
-}
-
 unsigned long long OwnStartTime() {
   std::ifstream in("/proc/self/stat");
   const std::string stat{std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
@@ -109,8 +92,6 @@ unsigned long long OwnStartTime() {
 // Temporaries of ended writers go, those of live ones and foreign files stay;
 // a reused process id with another start time counts as ended.
 TEST_F(AtomicFileTest, StaleTemporariesOfEndedWritersAreRemoved) {
-  if (!fs::exists("/proc/self/stat"))
-    GTEST_SKIP() << "no /proc: writers are told apart by process id alone";
   const pid_t child = ::fork();
   ASSERT_GE(child, 0);
   if (child == 0)
@@ -126,9 +107,7 @@ TEST_F(AtomicFileTest, StaleTemporariesOfEndedWritersAreRemoved) {
   const Case cases[] = {{".tmp-" + std::to_string(child) + "-" + start + hex, true},
                         {".tmp-" + self + "-" + start + "1" + hex, true},
                         {".tmp-" + self + "-" + start + hex, false},
-                        {".tmp-" + self + "-" + start + hex + "0", false},
-                        {".tmp-0123456789abcdef", false},
-                        {"tmp-" + std::to_string(child) + "-" + start + hex, false}};
+                        {".tmp-0123456789abcdef", false}};
   for (const Case& c : cases)
     std::ofstream(m_folder / c.name) << "debris";
   ASSERT_TRUE(SystemIO::WriteFileAtomically((m_folder / "old").string(), "new"));

@@ -8,6 +8,7 @@
 #include <string>
 #include <vector>
 
+#include <sys/stat.h>
 #include <unistd.h>
 
 namespace {
@@ -35,20 +36,16 @@ protected:
       fs::path(::testing::TempDir()) / ("FileSystemTest-" + std::to_string(::getpid()));
 };
 
-TEST_F(FileSystemTest, ReplaceAndRemoveChangeNothingWhenTheyFail) {
-  EXPECT_TRUE(File::Replace(PathOf(u"new"), PathOf(u"old")));
-  EXPECT_EQ(Read("old"), "new");
-  EXPECT_FALSE(fs::exists(m_folder / "new"));
-  EXPECT_FALSE(File::Replace(PathOf(u"new"), PathOf(u"b")));    // no source
-  EXPECT_FALSE(File::Replace(PathOf(u"b"), PathOf(u"folder"))); // a folder as target
-  EXPECT_FALSE(File::Replace(PathOf(u"b"), PathOf(std::u16string(u"x\0y", 3))));
-  EXPECT_EQ(Read("b"), "b");
-
-  EXPECT_TRUE(File::Remove(PathOf(u"b")));
-  EXPECT_FALSE(fs::exists(m_folder / "b"));
-  EXPECT_FALSE(File::Remove(PathOf(u"b")));
-  EXPECT_FALSE(File::Remove(PathOf(u"folder")));
-  EXPECT_TRUE(fs::is_directory(m_folder / "folder"));
+// Only regular files within the limit are read; a pipe is refused without
+// waiting for a writer. A failure leaves no bytes.
+TEST_F(FileSystemTest, ReadRegularRefusesWhatIsNotASmallRegularFile) {
+  ASSERT_EQ(::mkfifo((m_folder / "fifo").c_str(), 0600), 0);
+  std::string bytes, error;
+  EXPECT_TRUE(File::ReadRegular(PathOf(u"old"), 3, bytes, &error) && bytes == "old");
+  EXPECT_FALSE(File::ReadRegular(PathOf(u"old"), 2, bytes, &error));
+  EXPECT_EQ(bytes + error, "larger than 2 bytes");
+  EXPECT_FALSE(File::ReadRegular(PathOf(u"fifo"), 99, bytes, &error));
+  EXPECT_EQ(error, "not a regular file");
 }
 
 // Links to regular files count; folders, dangling links and names that no
