@@ -7,8 +7,8 @@
 // Last it saves two styles as presets in a folder, reads them back through a
 // new preset manager and applies one to a new style.
 //
-// Usage: WordProcessorDemo [file.json]   (default: a file in the temp folder;
-// the presets always go to WordProcessorDemoPresets in the temp folder)
+// Usage: WordProcessorDemo [file.json]   (by default the file, and always the
+// presets, go to a new folder under the temp folder, named in the output)
 #include <Styles/FolderPresetManager.h>
 #include <Styles/StyleManager.h>
 #include <Styles/StyleProperty.h>
@@ -20,6 +20,7 @@
 #include <ZelUtils/Stream.h>
 
 #include <cstdio>
+#include <cstdlib>
 #include <exception>
 #include <filesystem>
 #include <string>
@@ -267,9 +268,6 @@ int RunPresets(const StyleSheet& sheet, const std::filesystem::path& folder) {
   {
     Styles::FolderPresetManager presets(FromUtf8(folder.string()));
     const std::filesystem::path file = folder / ToUtf8(presets.GetFileName(setName));
-    // A set file left by an earlier run would stop CreatePresetSet.
-    std::error_code ignored;
-    std::filesystem::remove(file, ignored);
     if (!presets.CreatePresetSet(setName)) {
       std::fprintf(stderr, "Cannot create a preset set in %s\n", folder.string().c_str());
       return 1;
@@ -309,7 +307,7 @@ int RunPresets(const StyleSheet& sheet, const std::filesystem::path& folder) {
   return 0;
 }
 
-int Run(const Text& path) {
+int Run(const Text& path, const std::filesystem::path& folder) {
   {
     StyleSheet sheet;
     BuildSheet(sheet);
@@ -358,24 +356,26 @@ int Run(const Text& path) {
   for (const PropertyKey& category : {kParagraph, kCharacter, kTable})
     for (const Style* style : loaded.GetStylesByCategory(category))
       PrintStyle(loaded, *style);
-  return RunPresets(loaded, std::filesystem::temp_directory_path() / "WordProcessorDemoPresets");
+  return RunPresets(loaded, folder / "presets");
 }
 
 } // namespace
 
 int main(int argc, char** argv) {
-  Text path;
-  if (argc > 1) {
-    path = FromUtf8(argv[1]);
-  } else {
-    const std::filesystem::path file =
-        std::filesystem::temp_directory_path() / "WordProcessorDemo.json";
-    path = FromUtf8(file.string());
+  // A fresh folder of its own, so that no run meets another's files.
+  std::string folderName =
+      (std::filesystem::temp_directory_path() / "WordProcessorDemo-XXXXXX").string();
+  if (!mkdtemp(folderName.data())) {
+    std::fprintf(stderr, "Cannot create a folder under %s\n",
+                 std::filesystem::temp_directory_path().string().c_str());
+    return 1;
   }
+  const std::filesystem::path folder(folderName);
+  const Text path = FromUtf8(argc > 1 ? argv[1] : (folder / "WordProcessorDemo.json").string());
   RegisterCategories();
   int result = 1;
   try {
-    result = Run(path);
+    result = Run(path, folder);
   } catch (const std::exception& error) {
     std::fprintf(stderr, "Failed: %s\n", error.what());
   }

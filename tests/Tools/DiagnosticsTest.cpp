@@ -99,10 +99,14 @@ TEST_F(DiagnosticsTest, EachCodeFromTheSmallestDocumentThatRaisesIt) {
        "/paragraph/A/inherits", Severity::Error},
       {"duplicate-name", R"({"paragraph": {"Ä": {}}, "character": {"ä": {}}})", "/character/ä",
        Severity::Error},
-      {"unknown-category", R"({"heading": {}})", "/heading", Severity::Warning},
+      {"duplicate-member", R"({"paragraph": {"A": {"spaceAfter": "1", "spaceAfter": "2"}}})",
+       "/paragraph/A/spaceAfter", Severity::Error},
+      {"duplicate-member", R"({"version": 1, "version": 1})", "/version", Severity::Error},
+      {"reserved-name", R"({"clash": {"C": {}}})", "/clash", Severity::Error},
+      {"unknown-category", R"({"paragraph": {}, "heading": {}})", "/heading", Severity::Warning},
       {"unknown-property", R"({"paragraph": {"A": {"zoom": "2"}}})", "/paragraph/A/zoom",
        Severity::Warning},
-      {"unknown-member", R"({"author": "me"})", "/author", Severity::Warning},
+      {"unknown-member", R"({"paragraph": {}, "author": "me"})", "/author", Severity::Warning},
       {"value-replaced", R"({"shape": {"S": {"angle": "steep"}}})", "/shape/S/angle",
        Severity::Warning},
       {"number-rounded", R"({"paragraph": {"A": {"spaceAfter": 1.23456789}}})",
@@ -113,6 +117,10 @@ TEST_F(DiagnosticsTest, EachCodeFromTheSmallestDocumentThatRaisesIt) {
       {"deprecated-property", R"({"shape": {"S": {"legacyWidth": "1"}}})", "/shape/S/legacyWidth",
        Severity::Warning},
   };
+  // A host's category with a property named like a style's own member.
+  const PropertyKey clash(u"clash");
+  GetStyleManager().RegisterCategory(clash, u"Clash", false, false);
+  GetStyleManager().RegisterProperty(clash, PropertyKey(u"original"), new FragileProperty);
   for (const Case& c : cases) {
     SCOPED_TRACE(c.document);
     const std::vector<Diagnostic> diagnostics = ValidateDocument(U16(c.document));
@@ -123,6 +131,11 @@ TEST_F(DiagnosticsTest, EachCodeFromTheSmallestDocumentThatRaisesIt) {
       EXPECT_EQ(d.severity, c.severity);
     }
   }
+  GetStyleManager().DeregisterCategory(clash);
+  // Beside its warnings, a document of unknown members only reads as nothing.
+  const std::vector<Diagnostic> unread = ValidateDocument(U16(R"({"heading": {"H": {}}})"));
+  ASSERT_EQ(unread.size(), 2u);
+  EXPECT_EQ(unread[1].code, "nothing-read");
   // The sample document is clean.
   ZelUtils::Stream file = ZelUtils::FileStream::Open(U16(STYLES_SAMPLE_SHEET));
   const Text sample = ZelUtils::TextStreamReader(file, ZelUtils::TextStream::UTF8).ReadToEnd();

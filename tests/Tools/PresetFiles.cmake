@@ -23,7 +23,7 @@ endfunction()
 set(folder "${WORK_DIR}")
 file(WRITE "${folder}/bad.qsty" "{\"paragraph\": ")
 execute_process(COMMAND mkfifo "${folder}/pipe.qsty")
-run(4 "bad.qsty: .*\\[invalid-json\\].*preset recover --folder .* bad" "^$" list --folder ${folder} bad)
+run(4 "bad.qsty:.*\\[invalid-json\\].*preset recover --folder .* bad" "^$" list --folder ${folder} bad)
 run(3 "pipe.qsty: cannot be read: not a regular file.*preset recover" "^$" show --folder ${folder} pipe X)
 foreach(set bad pipe)
   run(0 "^$" "moved the damaged set file to .*${set}.qsty.damaged-[0-9]+T[0-9]+Z; the preset set \"${set}\" starts afresh"

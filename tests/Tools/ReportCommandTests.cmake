@@ -7,6 +7,6 @@ styles_command_test(Graph 0 graph ${STYLES_CLI_FILES}/names.json
 styles_command_test(ReportEscapesScript 0 report ${STYLES_CLI_FILES}/names.json
   OUTPUT "\"name\":\"\\\\u003c/script>\\\\u003cb>\",\"category\":2,\"parent\":3")
 styles_command_test(ReportAgainstBroken 4 report ${STYLES_SAMPLE} --against
-  ${STYLES_CLI_FILES}/broken.json ERROR "broken.json: .*\\[missing-parent\\]")
+  ${STYLES_CLI_FILES}/broken.json ERROR "broken.json:1:57: error: .*\\[missing-parent\\]")
 styles_command_test(ReportUnwritable 3 report ${STYLES_SAMPLE} -o ${STYLES_CLI_FILES}/absent/page.html
   ERROR "page.html: cannot be written: No such file")

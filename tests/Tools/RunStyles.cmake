@@ -2,17 +2,29 @@
 #   PROGRAM, ARGS (separated by "|"), STATUS (the exit status expected),
 #   optional OUTPUT and ERROR (regular expressions standard output and
 #   standard error must match), SAME_AS (a file standard output must equal),
-#   INPUT (a file for standard input) and WORK_DIR (made empty first).
+#   INPUT (a file for standard input), OUTPUT_TO (a file that receives
+#   standard output instead), RUN_IN (the working folder), WORK_DIR (made
+#   empty first), COPY (a file copied into WORK_DIR first), and RESULT with
+#   RESULT_SAME_AS (a file the run must leave equal to another).
 string(REPLACE "|" ";" arguments "${ARGS}")
 if(WORK_DIR)
   file(REMOVE_RECURSE "${WORK_DIR}")
   file(MAKE_DIRECTORY "${WORK_DIR}")
+  if(COPY)
+    file(COPY "${COPY}" DESTINATION "${WORK_DIR}")
+  endif()
 endif()
-set(input_option)
+set(options)
 if(INPUT)
-  set(input_option INPUT_FILE "${INPUT}")
+  list(APPEND options INPUT_FILE "${INPUT}")
 endif()
-execute_process(COMMAND "${PROGRAM}" ${arguments} ${input_option}
+if(OUTPUT_TO)
+  list(APPEND options OUTPUT_FILE "${OUTPUT_TO}")
+endif()
+if(RUN_IN)
+  list(APPEND options WORKING_DIRECTORY "${RUN_IN}")
+endif()
+execute_process(COMMAND "${PROGRAM}" ${arguments} ${options}
   RESULT_VARIABLE status OUTPUT_VARIABLE output ERROR_VARIABLE error)
 set(report "styles ${arguments}\n--- status ${status}\n--- output\n${output}--- error\n${error}")
 if(NOT status STREQUAL STATUS)
@@ -28,5 +40,12 @@ if(SAME_AS)
   file(READ "${SAME_AS}" expected)
   if(NOT output STREQUAL expected)
     message(FATAL_ERROR "output differs from ${SAME_AS}\n${report}")
+  endif()
+endif()
+if(RESULT)
+  file(READ "${RESULT}" result)
+  file(READ "${RESULT_SAME_AS}" expected)
+  if(NOT result STREQUAL expected)
+    message(FATAL_ERROR "${RESULT} differs from ${RESULT_SAME_AS}:\n${result}\n${report}")
   endif()
 endif()

@@ -8,10 +8,14 @@
 #include <Styles/StyleSheet.h>
 #include <Styles/StyleUtilities.h>
 
+#include <Json/Json.h>
 #include <ZelPref/ConversionPolicy.h>
 
 #include <gtest/gtest.h>
 
+#include <cmath>
+#include <limits>
+#include <map>
 #include <memory>
 #include <string>
 #include <vector>
@@ -39,6 +43,7 @@ TEST(SchemaTest, MalformedSchemasNameTheMemberAndRegisterNothing) {
       {R"({"categories": [{"name": "A"}]})", "/categories/0"},
       {R"({"categories": [{"key": "a.b"}]})", "/categories/0/key"},
       {R"({"categories": [{"key": "style"}]})", "/categories/0/key"},
+      {R"({"categories": [{"key": "a"}, {"key": "id"}]})", "/categories/1/key"},
       {R"({"categories": [{"key": "a"}, {"key": "a"}]})", "/categories/1/key"},
       {R"({"categories": [{"key": "a", "a/b~": 1}]})", "/categories/0/a~1b~0"},
       {R"({"version": -1, "categories": []})", "/version"},
@@ -155,6 +160,11 @@ TEST_F(StockBehaviourTest, PoliciesReadTextAndTypeChecksGuardBounds) {
       EXPECT_FALSE(c.readable);
     }
   }
+  // Numbers that no document could hold are refused, bounds or not.
+  const BaseStyleProperty* spaceAfter =
+      manager.GetStyleProperty(PropertyKey(u"paragraph"), PropertyKey(u"spaceAfter"));
+  for (const double number : {std::numeric_limits<double>::infinity(), std::nan("")})
+    EXPECT_FALSE(spaceAfter->CheckType(ZelUtils::Any(number)));
   // Colours are kept in upper case, so that equal colours compare equal.
   StyleSheet sheet;
   ASSERT_TRUE(sheet.ImportFromString(u"{\"character\": {\"C\": {\"colour\": \"#aabbcc\"}}}", true));
@@ -195,14 +205,26 @@ TEST(SchemaTest, FlagsAndVersionsShapeWhatIsWritten) {
         u"{\"version\": 3, \"note\": {\"N\": {\"text\": \"t\", \"scratch\": \"s\", "
         u"\"recent\": \"7\", \"inner\": {\"text\": \"i\"}}}}",
         true));
-    Text text;
-    sheet.ExportToString(text, false);
-    EXPECT_EQ(U8(text),
-              R"({"version":3,"note":{"N":{"text":"t","recent":"7","inner":{"text":"i"}}}})")
+    // The members "N" is written with, by name: their order follows key identity.
+    const auto written = [&sheet](bool includeTemporary) {
+      Json::Value document{Json::Object()};
+      sheet.ExportJson(document, includeTemporary);
+      std::map<std::string, std::string> members;
+      const Json::Object& style = document.Get<Json::Object>()
+                                      .Find(u"note")
+                                      ->Get<Json::Object>()
+                                      .Find(u"N")
+                                      ->Get<Json::Object>();
+      for (std::size_t i = 0; i < style.GetSize(); ++i)
+        members[U8(style.GetValueName(i))] = U8(Json::ValueToString(style.GetValue(i), false));
+      return members;
+    };
+    using Members = std::map<std::string, std::string>;
+    EXPECT_EQ(written(false),
+              (Members{{"text", "\"t\""}, {"recent", "\"7\""}, {"inner", R"({"text":"i"})"}}))
         << "temporary properties stay out unless asked for";
     sheet.SetVersion(2);
-    sheet.ExportToString(text, true);
-    EXPECT_EQ(U8(text), R"({"version":2,"note":{"N":{"text":"t","scratch":"s"}}})")
+    EXPECT_EQ(written(true), (Members{{"text", "\"t\""}, {"scratch", "\"s\""}}))
         << "properties newer than the sheet stay out, substyles included";
   }
   DeregisterSchema(registration);

@@ -1,8 +1,10 @@
 #include "Commands.h"
 
-#include "Graph.h"
-#include "Report.h"
 #include "WordDocuments.h"
+
+#include "Graph.h"
+#include "Input.h"
+#include "Report.h"
 
 #include <StylesTools/Diff.h>
 #include <StylesTools/Schema.h>
@@ -10,16 +12,24 @@
 #include <Styles/FolderPresetManager.h>
 #include <Styles/StyleSheet.h>
 
+#include <StylesTools/Rewrite.h>
+
 #include <Json/Json.h>
+#include <SystemIO/AtomicFile.h>
 #include <SystemIO/FileSystem.h>
 #include <SystemIO/Path.h>
 #include <ZelUtils/Stream.h>
 #include <ZelUtils/TextStream.h>
 
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
 #include <filesystem>
 #include <iostream>
 #include <iterator>
 #include <memory>
+#include <optional>
 #include <system_error>
 
 namespace StylesCommand {
@@ -27,6 +37,7 @@ namespace StylesCommand {
 using Styles::Style;
 using Styles::StyleSheet;
 using Styles::Tools::Diagnostic;
+using Styles::Tools::Severity;
 
 namespace {
 
@@ -42,67 +53,107 @@ std::string TitleOf(const std::string& path) {
   return std::filesystem::path(DisplayName(path)).filename().string();
 }
 
-// The whole of a file, or of standard input for "-", decoded from UTF-8.
-bool ReadText(const std::string& path, Text& text) {
-  ZelUtils::Stream stream;
-  if (path == "-") {
-    std::string bytes{std::istreambuf_iterator<char>(std::cin), std::istreambuf_iterator<char>()};
-    stream = ZelUtils::MemoryStream::FromBytes(std::move(bytes));
-  } else {
-    stream = ZelUtils::FileStream::Open(FromUtf8(path));
-    if (!stream)
-      return false;
+// Whether the file `path` is the one standard output writes to, as with
+// "styles format a.json > a.json".
+bool IsStandardOutput(const std::string& path) {
+  struct stat file, output;
+  return path != "-" && ::stat(path.c_str(), &file) == 0 && ::fstat(STDOUT_FILENO, &output) == 0 &&
+         S_ISREG(output.st_mode) && file.st_dev == output.st_dev && file.st_ino == output.st_ino;
+}
+
+// Reads a document's text; `diagnostics` gets an error for bytes that are not
+// UTF-8 (they are read as U+FFFD).
+int ReadDocument(const std::string& path, Text& text, std::vector<Diagnostic>& diagnostics) {
+  std::string bytes, reason;
+  if (!ReadBytes(path, bytes, reason)) {
+    Output::Error(DisplayName(path), "cannot be read: " + reason);
+    return kUnreadable;
   }
-  text = ZelUtils::TextStreamReader(stream, ZelUtils::TextStream::UTF8).ReadToEnd();
-  return true;
+  if (std::optional<Diagnostic> invalid = FindInvalidUtf8(bytes))
+    diagnostics.push_back(std::move(*invalid));
+  text = DecodeUtf8(std::move(bytes));
+  return kSuccess;
+}
+
+// Whether a command goes on after reading a document into a sheet, given the
+// diagnostics of the reading. Text that is not UTF-8 stops every command; what
+// a rewrite would lose stops a rewriting one, unless the loss is accepted.
+int Conclude(const std::string& path, std::vector<Diagnostic> diagnostics, bool imported,
+             Loss loss) {
+  const auto isEncoding = [](const Diagnostic& d) { return d.code == "invalid-utf8"; };
+  const bool badEncoding = std::any_of(diagnostics.begin(), diagnostics.end(), isEncoding);
+  if (!imported || (badEncoding && loss != Loss::Accept)) {
+    Output::DocumentErrors(DisplayName(path), diagnostics);
+    return kUnusable;
+  }
+  std::vector<Diagnostic> losses;
+  for (Diagnostic& d : diagnostics)
+    if (isEncoding(d) || Styles::Tools::LosesContent(d))
+      losses.push_back(d);
+  if (losses.empty() || loss == Loss::Ignore)
+    return kSuccess;
+  if (loss == Loss::Accept) {
+    for (Diagnostic& d : losses)
+      d.severity = Severity::Warning;
+    Output::Warnings(DisplayName(path), losses);
+    return kSuccess;
+  }
+  for (Diagnostic& d : losses)
+    d.severity = Severity::Error;
+  Output::DocumentErrors(DisplayName(path), losses,
+                         "writing the document again would lose or change what is listed; "
+                         "--lossy accepts that");
+  return kUnusable;
 }
 
 } // namespace
 
-int LoadSheet(const std::string& path, StyleSheet& sheet, std::vector<Diagnostic>* warnings) {
+int LoadSheet(const std::string& path, StyleSheet& sheet, Loss loss,
+              std::vector<Diagnostic>* warnings) {
   if (IsWordDocument(path))
     return LoadWordSheet(path, sheet, warnings);
   Text text;
-  if (!ReadText(path, text)) {
-    Output::Error(DisplayName(path), "cannot be read");
-    return kUnreadable;
-  }
   std::vector<Diagnostic> diagnostics;
-  if (!Styles::Tools::ImportChecked(sheet, text, true, &diagnostics)) {
-    Output::DocumentErrors(DisplayName(path), diagnostics);
-    return kUnusable;
-  }
-  if (warnings)
-    *warnings = std::move(diagnostics);
-  return kSuccess;
+  if (const int status = ReadDocument(path, text, diagnostics))
+    return status;
+  std::vector<Diagnostic> found;
+  const bool imported = Styles::Tools::ImportChecked(sheet, text, true, &found);
+  diagnostics.insert(diagnostics.end(), found.begin(), found.end());
+  return Conclude(path, std::move(diagnostics), imported, loss);
 }
 
 namespace {
 
 // Reads from `path` only what the style `name` depends on, all or nothing:
 // a large document answers for one style at the cost of that style alone.
-int LoadStyle(const std::string& path, const std::string& name, StyleSheet& sheet) {
+int LoadStyle(const std::string& path, const std::string& name, StyleSheet& sheet,
+              Loss loss = Loss::Ignore) {
   if (IsWordDocument(path))
     return LoadWordSheet(path, sheet, nullptr);
   Text text;
-  if (!ReadText(path, text)) {
-    Output::Error(DisplayName(path), "cannot be read");
-    return kUnreadable;
-  }
+  std::vector<Diagnostic> diagnostics;
+  if (const int status = ReadDocument(path, text, diagnostics))
+    return status;
   Json::Value value;
   Text parseError;
   if (!Json::Parse(text, value, parseError) || !value.Is<Json::Object>()) {
     // The full check says where the text goes wrong.
-    Output::DocumentErrors(DisplayName(path), Styles::Tools::ValidateDocument(text));
-    return kUnusable;
+    const std::vector<Diagnostic> found = Styles::Tools::ValidateDocument(text);
+    diagnostics.insert(diagnostics.end(), found.begin(), found.end());
+    return Conclude(path, std::move(diagnostics), false, loss);
   }
-  Json::Object part = Styles::Tools::SelectStyles(value.Get<Json::Object>(), {FromUtf8(name)});
-  std::vector<Diagnostic> diagnostics;
-  if (!Styles::Tools::ImportChecked(sheet, part, true, &diagnostics)) {
-    Output::DocumentErrors(DisplayName(path), diagnostics);
-    return kUnusable;
-  }
-  return kSuccess;
+  Json::Object selected = Styles::Tools::SelectStyles(value.Get<Json::Object>(), {FromUtf8(name)});
+  // Other members of the sheet belong to no style, and what they hold is no
+  // loss to the style's answer.
+  Json::Object part;
+  for (Json::Member& member : selected)
+    if (member.value.Is<Json::Object>() || member.name == u"version" || member.name == u"id")
+      part.AddValue(std::move(member.name), std::move(member.value));
+  std::vector<Diagnostic> found;
+  const bool imported = Styles::Tools::ImportChecked(sheet, part, true, &found);
+  Styles::Tools::LocateDiagnostics(text, found);
+  diagnostics.insert(diagnostics.end(), found.begin(), found.end());
+  return Conclude(path, std::move(diagnostics), imported, loss);
 }
 
 const Style* FindStyle(const StyleSheet& sheet, const std::string& document,
@@ -184,12 +235,13 @@ bool RegisterSchemaFile(const std::string& path, int& status) {
   if (path.empty()) {
     schema = Styles::Tools::DefaultSchema();
   } else {
-    Text text;
-    if (!ReadText(path, text)) {
-      Output::Error(DisplayName(path), "cannot be read");
+    std::string bytes, reason;
+    if (!ReadBytes(path, bytes, reason)) {
+      Output::Error(DisplayName(path), "cannot be read: " + reason);
       status = kUnreadable;
       return false;
     }
+    const Text text = DecodeUtf8(std::move(bytes));
     Styles::Tools::SchemaError error;
     if (!Styles::Tools::ParseSchema(text, schema, error)) {
       Output::Error(
@@ -221,12 +273,14 @@ int Validate(const CommonOptions& options, const std::vector<std::string>& docum
       continue;
     }
     Text text;
-    if (!ReadText(document, text)) {
-      Output::Error(DisplayName(document), "cannot be read");
+    std::vector<Diagnostic> diagnostics;
+    if (ReadDocument(document, text, diagnostics) != kSuccess) {
       unreadable = true;
       continue;
     }
-    files.push_back(FileDiagnostics{DisplayName(document), Styles::Tools::ValidateDocument(text)});
+    const std::vector<Diagnostic> found = Styles::Tools::ValidateDocument(text);
+    diagnostics.insert(diagnostics.end(), found.begin(), found.end());
+    files.push_back(FileDiagnostics{DisplayName(document), std::move(diagnostics)});
   }
   Output(options.json).Diagnostics(files);
   if (unreadable)
@@ -257,15 +311,18 @@ int Show(const CommonOptions& options, const std::string& document, const std::s
   return kSuccess;
 }
 
-int Flatten(const CommonOptions&, const std::string& document, const std::string& name) {
+int Flatten(const CommonOptions&, const std::string& document, const std::string& name,
+            bool lossy) {
   StyleSheet sheet;
-  if (const int status = LoadStyle(document, name, sheet))
+  if (const int status = LoadStyle(document, name, sheet, lossy ? Loss::Accept : Loss::Refuse))
     return status;
   const Style* style = FindStyle(sheet, document, name);
   if (!style)
     return kNegative;
   const std::unique_ptr<Style> flattened(style->CreateFlattenedStyle());
-  Output(true).Document(flattened->Serialize(sheet, true, true));
+  Json::Value value;
+  Styles::Tools::SerializeComplete(sheet, *flattened, value);
+  Output(true).Document(Json::ValueToString(value, true));
   return kSuccess;
 }
 
@@ -282,18 +339,31 @@ int Diff(const CommonOptions& options, const std::string& oldDocument,
   return differences.empty() ? kSuccess : kNegative;
 }
 
-int Format(const CommonOptions&, const std::string& document, bool compact) {
+int Format(const CommonOptions&, const std::string& document, const FormatOptions& format) {
   StyleSheet sheet;
-  std::vector<Diagnostic> warnings;
-  if (const int status = LoadSheet(document, sheet, &warnings))
+  if (format.output.empty() && !format.inPlace && IsStandardOutput(document)) {
+    Output::Error(document, "is also standard output, which was emptied before it could be "
+                            "read; --in-place rewrites a document");
+    return kUsage;
+  }
+  if (const int status =
+          LoadSheet(document, sheet, format.lossy ? Loss::Accept : Loss::Refuse))
     return status;
-  // What the sheet did not take is left out of the rewritten document.
-  for (const Diagnostic& warning : warnings)
-    Output::Error(DisplayName(document), "warning: " + ToUtf8(warning.pointer) + ": " +
-                                             ToUtf8(warning.message) + " [" + warning.code + "]");
-  Json::Value value{Json::Object()};
-  sheet.ExportJson(value, true);
-  Output(true).Document(Json::ValueToString(value, !compact));
+  Json::Value value;
+  Styles::Tools::ExportComplete(sheet, value);
+  const Text text = Json::ValueToString(value, !format.compact);
+  const std::string target = format.inPlace ? document : format.output;
+  if (target.empty()) {
+    Output(true).Document(text);
+    return kSuccess;
+  }
+  // A temporary file renamed over the target: the target holds the old
+  // document or the new one, never a part.
+  std::string error;
+  if (!SystemIO::WriteFileAtomically(target, ToUtf8(text) + "\n", &error)) {
+    Output::Error(target, "cannot be written: " + error);
+    return kUnreadable;
+  }
   return kSuccess;
 }
 

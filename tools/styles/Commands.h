@@ -2,7 +2,8 @@
 // Each returns the process's exit status:
 //   0 success, 1 a negative answer (errors found, differences, no such style
 //   or preset), 2 bad usage (also a malformed schema), 3 a file or folder
-//   that cannot be read, 4 a document whose errors keep it from being used.
+//   that cannot be read or written, 4 a document whose errors keep it from
+//   being used, or a rewrite that would lose part of it.
 #pragma once
 
 #include "Output.h"
@@ -32,19 +33,35 @@ bool RegisterSchemaFile(const std::string& path, int& status);
 // Takes out what RegisterSchemaFile registered, once no style is left.
 void DeregisterSchemaFile();
 
-// Reads the document `path` (JSON or Word) into `sheet` all or nothing; its
-// warnings go to `warnings`. kSuccess, or the status of the problem printed.
-int LoadSheet(const std::string& path, Styles::StyleSheet& sheet,
+// How a command takes what reading a document cannot keep: a read-only one
+// ignores it, a rewriting one refuses it or (with --lossy) warns.
+enum class Loss { Ignore, Refuse, Accept };
+
+// Reads the document `path` (JSON or Word) into `sheet` all or nothing; a Word
+// file's warnings go to `warnings`. kSuccess, or the status of the problem printed.
+int LoadSheet(const std::string& path, Styles::StyleSheet& sheet, Loss loss = Loss::Ignore,
               std::vector<Styles::Tools::Diagnostic>* warnings = nullptr);
 
 int Validate(const CommonOptions& options, const std::vector<std::string>& documents);
 int List(const CommonOptions& options, const std::string& document);
 int Show(const CommonOptions& options, const std::string& document, const std::string& style,
          bool explain);
-int Flatten(const CommonOptions& options, const std::string& document, const std::string& style);
+// Prints the flattened style, temporary values included; refuses a document
+// whose reading loses content unless `lossy`.
+int Flatten(const CommonOptions& options, const std::string& document, const std::string& style,
+            bool lossy);
 int Diff(const CommonOptions& options, const std::string& oldDocument,
          const std::string& newDocument, bool effective);
-int Format(const CommonOptions& options, const std::string& document, bool compact);
+// How format writes the document.
+struct FormatOptions {
+  bool compact = false; // one line
+  bool lossy = false;   // rewrite even when reading loses content
+  std::string output;   // a file to write instead of standard output
+  bool inPlace = false; // write back to the document's own file
+};
+// Rewrites the document in canonical form, keeping all that the sheet holds;
+// refuses a document whose reading loses content unless format.lossy.
+int Format(const CommonOptions& options, const std::string& document, const FormatOptions& format);
 // The HTML report of `document` to `output` (standard output when empty),
 // marking what changed since `against` when it is not empty.
 int Report(const CommonOptions& options, const std::string& document, const std::string& output,

@@ -6,10 +6,15 @@
 
 #include <Json/Json.h>
 
+#include <unistd.h>
+
 #include <algorithm>
+#include <cerrno>
 #include <cstdio>
+#include <cstring>
 #include <iostream>
 #include <map>
+#include <sstream>
 #include <utility>
 
 namespace StylesCommand {
@@ -55,6 +60,65 @@ const char* SourceName(ValueSource source) {
     break;
   }
   return "default";
+}
+
+// "FILE:LINE:COLUMN: error: POINTER: message [code]", as compilers print.
+std::string DiagnosticLine(const std::string& file, const Diagnostic& d) {
+  std::string line = file;
+  if (d.line > 0)
+    line += ':' + std::to_string(d.line) + ':' + std::to_string(d.column);
+  line += std::string(": ") + SeverityName(d.severity) + ": ";
+  if (!d.pointer.IsEmpty())
+    line += ToUtf8(d.pointer) + ": ";
+  return line + ToUtf8(d.message) + " [" + d.code + "]";
+}
+
+Json::Value DiagnosticsJson(const std::vector<Diagnostic>& diagnostics) {
+  Json::Array list;
+  for (const Diagnostic& d : diagnostics) {
+    Json::Object item;
+    item.AddValue(u"severity", AsciiText(SeverityName(d.severity)));
+    item.AddValue(u"code", AsciiText(d.code));
+    item.AddValue(u"pointer", Json::Value(d.pointer));
+    item.AddValue(u"message", Json::Value(d.message));
+    if (d.line > 0) {
+      item.AddValue(u"line", Json::Value(d.line));
+      item.AddValue(u"column", Json::Value(d.column));
+    }
+    list.AddValue(Json::Value(std::move(item)));
+  }
+  return Json::Value(std::move(list));
+}
+
+// Where a style lives, for programs: the name of its outermost owner in the
+// sheet and the path down to it ("cells[1].character"; empty for a style of
+// the sheet itself). Null when it belongs to no style of the sheet.
+Json::Value StyleLocation(const StyleSheet& sheet, const Style* style) {
+  if (!style)
+    return Json::Value();
+  std::vector<std::string> steps;
+  const Style* outermost = style;
+  for (; outermost->GetOwner(); outermost = outermost->GetOwner()) {
+    const Styles::PropertyKey& key = outermost->GetOwnerPropertyKey();
+    std::string step = ToUtf8(key.GetString());
+    const ZelUtils::Any* held = outermost->GetOwner()->GetProperties().Find(key);
+    if (const auto* list = held ? held->GetIf<std::vector<Style*>>() : nullptr) {
+      const auto found = std::find(list->begin(), list->end(), outermost);
+      if (found != list->end())
+        step += '[' + std::to_string(found - list->begin()) + ']';
+    }
+    steps.push_back(std::move(step));
+  }
+  const Text name = sheet.GetStyleName(outermost);
+  if (name.IsEmpty())
+    return Json::Value();
+  std::string path;
+  for (auto step = steps.rbegin(); step != steps.rend(); ++step)
+    path += (path.empty() ? "" : ".") + *step;
+  Json::Object location;
+  location.AddValue(u"style", Json::Value(name));
+  location.AddValue(u"path", Json::Value(FromUtf8(path)));
+  return Json::Value(std::move(location));
 }
 
 // Where a value comes from, for people.
@@ -110,37 +174,95 @@ std::string ToUtf8(const Text& text) { return ZelPlatform::Utf16ToUtf8(text.GetV
 
 Text FromUtf8(const std::string& text) { return Text(ZelPlatform::Utf8ToUtf16(text)); }
 
+// What the command prints to standard output, collected until Finish, and
+// the first error, which --json prints instead.
+struct Output::State {
+  bool json = false;
+  std::ostringstream collected;
+  std::streambuf* standardOutput = nullptr;
+  bool failed = false;
+  Json::Object error;
+};
+
+Output::State& Output::Shared() {
+  static State state;
+  return state;
+}
+
+void Output::Begin(bool json) {
+  State& state = Shared();
+  state.json = json;
+  state.standardOutput = std::cout.rdbuf(state.collected.rdbuf());
+}
+
+bool Output::Finish(int status) {
+  State& state = Shared();
+  if (state.standardOutput)
+    std::cout.rdbuf(state.standardOutput);
+  std::string bytes = state.collected.str();
+  if (state.json && state.failed) {
+    Json::Object error;
+    error.AddValue(u"status", Json::Value(status));
+    for (Json::Member& member : state.error)
+      error.AddValue(member.name, std::move(member.value));
+    Json::Object result;
+    result.AddValue(u"error", Json::Value(std::move(error)));
+    bytes = ToUtf8(Json::ValueToString(Json::Value(std::move(result)), true)) + "\n";
+  }
+  // Written and closed by hand: a full disk or a closed pipe must show.
+  for (std::size_t written = 0; written < bytes.size();) {
+    const ssize_t count = ::write(STDOUT_FILENO, bytes.data() + written, bytes.size() - written);
+    if (count < 0 && errno == EINTR)
+      continue;
+    if (count <= 0) {
+      std::cerr << "styles: cannot write standard output: " << std::strerror(errno) << '\n';
+      return false;
+    }
+    written += static_cast<std::size_t>(count);
+  }
+  if (::close(STDOUT_FILENO) != 0 && errno != EBADF) {
+    std::cerr << "styles: cannot write standard output: " << std::strerror(errno) << '\n';
+    return false;
+  }
+  return true;
+}
+
 void Output::Error(const std::string& file, const std::string& message) {
   std::cerr << "styles: " << (file.empty() ? "" : file + ": ") << message << '\n';
+  State& state = Shared();
+  if (state.failed)
+    return;
+  state.failed = true;
+  state.error.AddValue(u"file", TextOrNull(FromUtf8(file), !file.empty()));
+  state.error.AddValue(u"message", Json::Value(FromUtf8(message)));
 }
 
 void Output::Error(const std::string& file, const Text& message) { Error(file, ToUtf8(message)); }
 
-void Output::DocumentErrors(const std::string& file, const std::vector<Diagnostic>& diagnostics) {
+void Output::DocumentErrors(const std::string& file, const std::vector<Diagnostic>& diagnostics,
+                            const std::string& conclusion) {
+  std::vector<Diagnostic> errors;
   for (const Diagnostic& d : diagnostics)
-    if (d.severity == Severity::Error)
-      Error(file, ToUtf8(d.pointer) + (d.pointer.IsEmpty() ? "" : ": ") + ToUtf8(d.message) + " [" +
-                      d.code + "]");
-  Error(file, "the document has errors; \"styles validate\" lists them all");
+    if (d.severity == Severity::Error) {
+      std::cerr << "styles: " << DiagnosticLine(file, d) << '\n';
+      errors.push_back(d);
+    }
+  const bool first = !Shared().failed;
+  Error(file, conclusion);
+  if (first)
+    Shared().error.AddValue(u"diagnostics", DiagnosticsJson(errors));
+}
+
+void Output::Warnings(const std::string& file, const std::vector<Diagnostic>& diagnostics) {
+  for (const Diagnostic& d : diagnostics)
+    std::cerr << "styles: " << DiagnosticLine(file, d) << '\n';
 }
 
 void Output::Diagnostics(const std::vector<FileDiagnostics>& files) const {
   if (m_json) {
     Json::Array list;
     for (const FileDiagnostics& file : files) {
-      Json::Array diagnostics;
-      for (const Diagnostic& d : file.diagnostics) {
-        Json::Object item;
-        item.AddValue(u"severity", AsciiText(SeverityName(d.severity)));
-        item.AddValue(u"code", AsciiText(d.code));
-        item.AddValue(u"pointer", Json::Value(d.pointer));
-        item.AddValue(u"message", Json::Value(d.message));
-        if (d.line > 0) {
-          item.AddValue(u"line", Json::Value(d.line));
-          item.AddValue(u"column", Json::Value(d.column));
-        }
-        diagnostics.AddValue(Json::Value(std::move(item)));
-      }
+      Json::Value diagnostics = DiagnosticsJson(file.diagnostics);
       Json::Object entry;
       entry.AddValue(u"file", AsciiText(file.file));
       entry.AddValue(u"valid", Json::Value(!Styles::Tools::HasErrors(file.diagnostics)));
@@ -154,13 +276,7 @@ void Output::Diagnostics(const std::vector<FileDiagnostics>& files) const {
     std::size_t errors = 0;
     for (const Diagnostic& d : file.diagnostics) {
       errors += d.severity == Severity::Error ? 1 : 0;
-      std::cout << file.file;
-      if (d.line > 0)
-        std::cout << ':' << d.line << ':' << d.column;
-      std::cout << ": " << SeverityName(d.severity) << ": ";
-      if (!d.pointer.IsEmpty())
-        std::cout << ToUtf8(d.pointer) << ": ";
-      std::cout << ToUtf8(d.message) << " [" << d.code << "]\n";
+      std::cout << DiagnosticLine(file.file, d) << '\n';
     }
     const std::size_t warnings = file.diagnostics.size() - errors;
     if (file.diagnostics.empty())
@@ -241,10 +357,12 @@ void Output::Values(const StyleSheet& sheet, const Style& style, bool explain) c
       item.AddValue(u"value", Json::Value(Styles::Tools::FormatValue(*value.behaviour,
                                                                      *value.resolution.value)));
       item.AddValue(u"source", AsciiText(SourceName(value.resolution.source)));
-      const Text from = Styles::Tools::DescribeStyle(sheet, value.resolution.holder);
       const bool inherited = value.resolution.source == ValueSource::Ancestor ||
                              value.resolution.source == ValueSource::Owner;
-      item.AddValue(u"from", TextOrNull(from, inherited && !from.IsEmpty()));
+      item.AddValue(u"from", inherited ? StyleLocation(sheet, value.resolution.holder)
+                                       : Json::Value());
+      if (value.resolution.source == ValueSource::Owner)
+        item.AddValue(u"through", StyleLocation(sheet, value.resolution.owner));
       items.AddValue(Json::Value(std::move(item)));
     }
     Json::Object result;

@@ -31,12 +31,26 @@ class Output {
 public:
   explicit Output(bool json) : m_json(json) {}
 
-  // A problem that stops a command, on standard error: "styles: FILE: message".
+  // Collects standard output from here on, so that a command that fails
+  // prints its error alone, and a failing write is noticed.
+  static void Begin(bool json);
+  // Writes what was collected to standard output, or with --json after an
+  // error only the error object ({"error": {...}} with `status`), and closes
+  // it. False, with the reason on standard error, when a write fails.
+  static bool Finish(int status);
+
+  // A problem that stops a command, on standard error: "styles: FILE: message";
+  // with --json, the first one is also the error object.
   static void Error(const std::string& file, const std::string& message);
   static void Error(const std::string& file, const Text& message);
-  // The errors (and warnings) that keep a document from being used.
-  static void DocumentErrors(const std::string& file,
-                             const std::vector<Styles::Tools::Diagnostic>& diagnostics);
+  // The errors among `diagnostics` of a document, with line and column,
+  // followed by `conclusion`; they make up the error.
+  static void DocumentErrors(
+      const std::string& file, const std::vector<Styles::Tools::Diagnostic>& diagnostics,
+      const std::string& conclusion = "the document has errors; \"styles validate\" lists them all");
+  // Warnings about a document, on standard error; not an error.
+  static void Warnings(const std::string& file,
+                       const std::vector<Styles::Tools::Diagnostic>& diagnostics);
 
   void Diagnostics(const std::vector<FileDiagnostics>& files) const;
   // Each category's styles as inheritance trees.
@@ -50,6 +64,9 @@ public:
   void Message(const std::string& text) const;
 
 private:
+  struct State;
+  static State& Shared();
+
   bool m_json;
 };
 

@@ -1,5 +1,7 @@
 #include "Report.h"
 
+#include <SystemIO/AtomicFile.h>
+
 #include "Commands.h"
 #include "Graph.h"
 
@@ -196,20 +198,14 @@ std::string BuildReport(const StyleSheet& sheet, const std::string& title,
 }
 
 int WriteOutput(const std::string& text, const std::string& path) {
-  if (path.empty()) {
-    std::cout << text << std::flush;
-    if (std::cout)
-      return kSuccess;
-    Output::Error("<stdout>", std::string("cannot be written: ") + std::strerror(errno));
-    return kUnreadable;
+  if (path.empty() || path == "-") {
+    std::cout << text; // collected and checked when the command finishes
+    return kSuccess;
   }
-  std::ofstream file(path, std::ios::binary | std::ios::trunc);
-  if (file)
-    file << text;
-  if (file)
-    file.close();
-  if (!file) {
-    Output::Error(path, std::string("cannot be written: ") + std::strerror(errno));
+  // Renamed over the target when complete: never half a file, nor debris.
+  std::string error;
+  if (!SystemIO::WriteFileAtomically(path, text, &error)) {
+    Output::Error(path, "cannot be written: " + error);
     return kUnreadable;
   }
   return kSuccess;

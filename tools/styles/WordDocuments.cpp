@@ -1,5 +1,8 @@
 #include "WordDocuments.h"
 
+#include "Input.h"
+#include "Report.h"
+
 #include <StylesWord/WordFile.h>
 #include <StylesWord/WordSchema.h>
 
@@ -30,36 +33,9 @@ Styles::Tools::SchemaRegistration& Registration() {
 
 std::string DisplayName(const std::string& path) { return path == "-" ? "<stdin>" : path; }
 
-// Standard input, once a Word file has been found there; read once and kept.
-std::optional<std::string>& StandardInput() {
-  static std::optional<std::string> input;
-  return input;
-}
-
 bool ReadBytes(const std::string& path, std::string& bytes) {
-  if (path == "-") {
-    if (!StandardInput())
-      StandardInput() =
-          std::string{std::istreambuf_iterator<char>(std::cin), std::istreambuf_iterator<char>()};
-    bytes = *StandardInput();
-    return true;
-  }
-  std::ifstream file(path, std::ios::binary);
-  if (!file)
-    return false;
-  std::ostringstream text;
-  text << file.rdbuf();
-  bytes = text.str();
-  return true;
-}
-
-bool WriteBytes(const std::string& path, const std::string& bytes) {
-  if (path == "-") {
-    std::cout << bytes;
-    return static_cast<bool>(std::cout.flush());
-  }
-  std::ofstream file(path, std::ios::binary);
-  return file && file.write(bytes.data(), static_cast<std::streamsize>(bytes.size()));
+  std::string reason;
+  return StylesCommand::ReadBytes(path, bytes, reason);
 }
 
 std::string Where(const Styles::Word::Problem& problem) {
@@ -83,11 +59,7 @@ Diagnostic AsDiagnostic(const Styles::Word::Problem& problem, Severity severity)
 bool IsWordDocument(const std::string& path) {
   // A package starts with "PK", XML with "<" (after a byte order mark); a JSON
   // document with neither, and is left unread for the JSON reader.
-  if (path == "-" && !StandardInput()) {
-    const int first = std::cin.peek();
-    if (first != 'P' && first != '<' && first != 0xEF)
-      return false;
-  } else if (path != "-") {
+  if (path != "-") {
     std::ifstream file(path, std::ios::binary);
     char start[3] = {};
     file.read(start, sizeof start);
@@ -152,11 +124,10 @@ int Convert(const CommonOptions&, const std::string& input, const std::string& i
   const bool word = IsWordDocument(input);
   StyleSheet sheet;
   std::vector<Diagnostic> warnings;
-  if (const int status = LoadSheet(input, sheet, &warnings))
+  if (const int status = LoadSheet(input, sheet, Loss::Ignore, &warnings))
     return status;
-  for (const Diagnostic& warning : warnings)
-    Output::Error(DisplayName(input), "warning: " + ToUtf8(warning.pointer) + ": " +
-                                          ToUtf8(warning.message) + " [" + warning.code + "]");
+  if (!warnings.empty())
+    Output::Warnings(DisplayName(input), warnings);
   std::string result;
   if (!into.empty()) {
     std::string package;
@@ -177,11 +148,7 @@ int Convert(const CommonOptions&, const std::string& input, const std::string& i
   } else {
     result = Styles::Word::WriteStylesPart(sheet);
   }
-  if (!WriteBytes(output, result)) {
-    Output::Error(DisplayName(output), "cannot be written");
-    return kUnreadable;
-  }
-  return kSuccess;
+  return WriteOutput(result, output);
 }
 
 } // namespace StylesCommand

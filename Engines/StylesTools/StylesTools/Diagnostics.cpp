@@ -1,5 +1,6 @@
 #include <StylesTools/Diagnostics.h>
 
+#include <Internal/MemberPositions.h>
 #include <Internal/ToolsSupport.h>
 
 #include <Styles/Internal/DocumentVersion.h>
@@ -43,22 +44,6 @@ constexpr std::size_t kNone = ~std::size_t(0);
 // The names whose unreadable values a plain import replaces instead of failing.
 bool IsRepairedName(const Text& name) {
   return name == u"xScale" || name == u"yScale" || name == u"angle" || name == u"skew";
-}
-
-// Line and column (from 1) of a UTF-16 offset, columns in characters.
-std::pair<int, int> LineAndColumn(const Text& text, std::size_t offset) {
-  int line = 1, column = 1;
-  const std::size_t end = std::min(offset, text.GetLength());
-  for (std::size_t i = 0; i < end; ++i) {
-    const char16_t c = text[i];
-    if (c == u'\n') {
-      ++line;
-      column = 1;
-    } else if (c < 0xDC00 || c > 0xDFFF || i == 0 || text[i - 1] < 0xD800 || text[i - 1] > 0xDBFF) {
-      ++column; // the second half of a surrogate pair is not a character of its own
-    }
-  }
-  return {line, column};
 }
 
 // The offset the parser's message ends with ("... at offset N"), if any.
@@ -108,7 +93,16 @@ public:
       : m_manager(GetStyleManager()), m_target(target), m_replace(replace) {}
 
   std::vector<Diagnostic> Run(const Json::Object& document) {
+    for (const char16_t* name : {kVersion, kExternalID})
+      if (m_manager.CategoryExists(name))
+        Add(Severity::Error, "reserved-name", Text(u"/") + name,
+            u"the registered category " + Quoted(name) +
+                u" has the name of a document's own member; its styles cannot be written");
+    CheckRepeatedNames(document, nullptr);
     CollectStyles(document);
+    if (!m_understood && m_unknownSeen)
+      Add(Severity::Error, "nothing-read", Text(),
+          u"no member of the document is a registered category; no style would be read");
     const int current = m_manager.GetCurrentVersion();
     if (m_versionSeen && current >= 0 && m_documentVersion > current)
       Add(Severity::Warning, "version-too-new", u"/version",
@@ -164,11 +158,14 @@ private:
         continue;
       }
       if (!m_manager.CategoryExists(name)) {
+        m_unknownSeen = true;
         Add(Severity::Warning, "unknown-category", where,
             u"category " + Quoted(name) + u" is not registered; its styles are skipped");
         continue;
       }
+      m_understood = true;
       const PropertyKey categoryKey(name);
+      CheckReservedProperties(categoryKey, where);
       m_styles.reserve(m_styles.size() + category->GetSize());
       m_nodes.reserve(m_nodes.size() + category->GetSize());
       for (std::size_t j = 0; j < category->GetSize(); ++j) {
@@ -186,6 +183,47 @@ private:
     }
   }
 
+  // Reports each name that `object` holds more than once; the reading keeps
+  // only one of the values. Style names of a category are checked by AddName.
+  void CheckRepeatedNames(const Json::Object& object, const Where* where) {
+    const std::size_t size = object.GetSize();
+    if (size < 2)
+      return;
+    const auto report = [&](std::size_t i) {
+      const Text& name = object.GetValueName(i);
+      Add(Severity::Error, "duplicate-member", Where{where, &name},
+          u"member " + Quoted(name) + u" appears more than once; only one of its values is read");
+    };
+    if (size <= 16) { // most styles: no set to build
+      for (std::size_t i = 1; i < size; ++i)
+        for (std::size_t j = 0; j < i; ++j)
+          if (object.GetValueName(i) == object.GetValueName(j)) {
+            report(i);
+            break;
+          }
+      return;
+    }
+    std::unordered_set<std::u16string_view> seen;
+    for (std::size_t i = 0; i < size; ++i)
+      if (!seen.insert(object.GetValueName(i).GetView()).second)
+        report(i);
+  }
+
+  // A property whose key is a style's own member can be neither read nor
+  // written apart from that member; reported once per category.
+  void CheckReservedProperties(const PropertyKey& categoryKey, const Where& where) {
+    const std::shared_ptr<StyleCategory>* category = m_manager.FindCategory(categoryKey);
+    if (!category || !m_reservedChecked.insert(categoryKey.GetString().GetView()).second)
+      return;
+    for (const char16_t* name : {kInherits, kExternalID, kExternalName}) {
+      const std::optional<PropertyKey> key = PropertyKey::Find(name);
+      if (key && (*category)->GetStyleProperty(*key))
+        Add(Severity::Error, "reserved-name", where,
+            u"category " + Quoted(categoryKey.GetString()) + u" registers a property " +
+                Quoted(name) + u", the name of a style's own member");
+    }
+  }
+
   void CheckSheetMember(const Text& name, const Json::Value& value, const Where& where) {
     if (name == kVersion) {
       if (const double* number = value.GetIf<double>()) {
@@ -198,6 +236,7 @@ private:
       if (!value.Is<Text>())
         Add(Severity::Error, "wrong-kind", where, u"the sheet's id must be a string");
     } else {
+      m_unknownSeen = true;
       Add(Severity::Warning, "unknown-member", where,
           u"member " + Quoted(name) + u" is neither a category, the version nor the id");
     }
@@ -261,6 +300,7 @@ private:
               u" is not registered; the substyle is read empty");
       return;
     }
+    CheckRepeatedNames(object, &where);
     for (std::size_t i = 0; i < object.GetSize(); ++i) {
       const Text& name = object.GetValueName(i);
       const Json::Value& value = object.GetValue(i);
@@ -426,6 +466,9 @@ private:
   bool m_replace;
   int m_documentVersion = 0;
   bool m_versionSeen = false;
+  bool m_understood = false;  // some member is a registered category
+  bool m_unknownSeen = false; // some member is an unknown category or member
+  std::unordered_set<std::u16string_view> m_reservedChecked;
   std::vector<DocumentStyle> m_styles;
   std::size_t m_current = kNone; // the document style being checked
   std::vector<Node> m_nodes;
@@ -442,7 +485,7 @@ Json::Object* ParseDocument(const Text& text, Json::Value& value,
     Diagnostic diagnostic{Severity::Error, "invalid-json", Text(), u"not JSON: " + errorText, 0, 0};
     std::size_t offset = 0;
     if (ParseErrorOffset(errorText, offset))
-      std::tie(diagnostic.line, diagnostic.column) = LineAndColumn(text, offset);
+      std::tie(diagnostic.line, diagnostic.column) = detail::LinesAndColumns(text, {offset})[0];
     diagnostics.push_back(std::move(diagnostic));
     return nullptr;
   }
@@ -470,8 +513,10 @@ bool HasErrors(const std::vector<Diagnostic>& diagnostics) {
 std::vector<Diagnostic> ValidateDocument(const Text& text) {
   std::vector<Diagnostic> diagnostics;
   Json::Value value;
-  if (const Json::Object* document = ParseDocument(text, value, diagnostics))
-    return ValidateDocument(*document);
+  if (const Json::Object* document = ParseDocument(text, value, diagnostics)) {
+    diagnostics = ValidateDocument(*document);
+    detail::LocateMembers(text, diagnostics);
+  }
   return diagnostics;
 }
 
@@ -480,12 +525,20 @@ std::vector<Diagnostic> ValidateDocument(const Json::Object& document, const Sty
   return Validator(target, replace).Run(document);
 }
 
+void LocateDiagnostics(const Text& text, std::vector<Diagnostic>& diagnostics) {
+  detail::LocateMembers(text, diagnostics);
+}
+
 bool ImportChecked(StyleSheet& target, const Text& text, bool replace,
                    std::vector<Diagnostic>* diagnostics) {
   std::vector<Diagnostic> found;
   Json::Value value;
-  if (Json::Object* document = ParseDocument(text, value, found))
-    return ImportChecked(target, *document, replace, diagnostics);
+  if (Json::Object* document = ParseDocument(text, value, found)) {
+    const bool imported = ImportChecked(target, *document, replace, diagnostics);
+    if (diagnostics)
+      detail::LocateMembers(text, *diagnostics);
+    return imported;
+  }
   if (diagnostics)
     *diagnostics = std::move(found);
   return false;
@@ -582,78 +635,6 @@ bool ImportChecked(StyleSheet& target, Json::Object& document, bool replace,
   target.SetVersion(scratch.GetVersion());
   target.SetExternalID(scratch.GetExternalID());
   return finish(true);
-}
-
-Json::Object SelectStyles(const Json::Object& document, const std::vector<Text>& names) {
-  StyleManager& manager = GetStyleManager();
-  // Every style member of a registered category, sorted by name ignoring
-  // case (one block, not a node per name: documents may be large).
-  using Entry = std::pair<std::u16string_view, const Json::Value*>;
-  std::vector<Entry> members;
-  for (std::size_t i = 0; i < document.GetSize(); ++i) {
-    const Json::Object* category = document.GetValue(i).GetIf<Json::Object>();
-    if (!category || !manager.CategoryExists(document.GetValueName(i)))
-      continue;
-    for (std::size_t j = 0; j < category->GetSize(); ++j)
-      members.emplace_back(category->GetValueName(j).GetView(), &category->GetValue(j));
-  }
-  const auto byName = [](const Entry& a, const Entry& b) {
-    return ZelUtils::String::LessThanCaseInsensitive()(a.first, b.first);
-  };
-  std::stable_sort(members.begin(), members.end(), byName);
-
-  // The names needed, found by following every "inherits" at any depth.
-  const WImportStyleInfo& info = manager.GetImportStyleInfo();
-  std::unordered_set<const Json::Value*> selected;
-  std::vector<const Json::Value*> pending;
-  const auto need = [&](const Text& name) {
-    if (info.names.count(name))
-      return;
-    const auto renamed = info.renames.find(name);
-    const Entry key((renamed != info.renames.end() ? renamed->second : name).GetView(), nullptr);
-    const auto [first, last] = std::equal_range(members.begin(), members.end(), key, byName);
-    for (auto member = first; member != last; ++member)
-      if (selected.insert(member->second).second)
-        pending.push_back(member->second);
-  };
-  for (const Text& name : names)
-    need(name);
-  while (!pending.empty()) {
-    const Json::Value* value = pending.back();
-    pending.pop_back();
-    if (const Json::Object* object = value->GetIf<Json::Object>()) {
-      for (std::size_t i = 0; i < object->GetSize(); ++i) {
-        const Json::Value& member = object->GetValue(i);
-        if (const Text* parent = member.GetIf<Text>()) {
-          if (object->GetValueName(i) == kInherits)
-            need(*parent);
-        } else if (member.Is<Json::Object>() || member.Is<Json::Array>()) {
-          pending.push_back(&member); // substyles and their lists
-        }
-      }
-    } else if (const Json::Array* array = value->GetIf<Json::Array>()) {
-      for (std::size_t i = 0; i < array->GetSize(); ++i)
-        pending.push_back(&array->GetValue(i));
-    }
-  }
-
-  Json::Object part;
-  for (std::size_t i = 0; i < document.GetSize(); ++i) {
-    const Text& name = document.GetValueName(i);
-    const Json::Value& value = document.GetValue(i);
-    const Json::Object* category = value.GetIf<Json::Object>();
-    if (!category) {
-      part.AddValue(name, value);
-      continue;
-    }
-    Json::Object kept;
-    for (std::size_t j = 0; j < category->GetSize(); ++j)
-      if (selected.count(&category->GetValue(j)))
-        kept.AddValue(category->GetValueName(j), category->GetValue(j));
-    if (!kept.IsEmpty())
-      part.AddValue(name, Json::Value(std::move(kept)));
-  }
-  return part;
 }
 
 } // namespace Tools

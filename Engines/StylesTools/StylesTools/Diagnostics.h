@@ -30,7 +30,8 @@ enum class Severity { Error, Warning };
 /// Codes, stable across versions (tools match on them):
 /// - errors:   invalid-json, not-an-object, style-not-object, wrong-kind,
 ///             bad-value, type-rejected, missing-parent, inheritance-cycle,
-///             parent-category, duplicate-name, behaviour-failed
+///             parent-category, duplicate-name, duplicate-member,
+///             reserved-name, nothing-read, behaviour-failed
 /// - warnings: unknown-category, unknown-property, unknown-member,
 ///             value-replaced, number-rounded, version-too-new,
 ///             property-too-new, deprecated-property, name-taken
@@ -45,7 +46,9 @@ struct STYLES_TOOLS_API Diagnostic {
   ZelStringT<char16_t> message;
   ///@{
 
-  /// Line and column (from 1, in characters) of text that is not JSON; else 0.
+  /// Line and column (from 1, in characters) where the text stops being JSON,
+  /// or where the member the pointer names starts, when the diagnostic came
+  /// from checking text; else 0.
   int line = 0;
   int column = 0;
   ///@}
@@ -66,6 +69,13 @@ STYLES_TOOLS_API std::vector<Diagnostic> ValidateDocument(const ZelStringT<char1
 STYLES_TOOLS_API std::vector<Diagnostic> ValidateDocument(const Json::Object& document,
                                                           const StyleSheet* target = nullptr,
                                                           bool replace = false);
+
+/// Gives each of `diagnostics` that names a member of the JSON text `text` and
+/// has no line yet the line and column where that member starts (ValidateDocument
+/// and ImportChecked on text do this themselves). A diagnostic that reports a
+/// repeated name points at the repetition.
+STYLES_TOOLS_API void LocateDiagnostics(const ZelStringT<char16_t>& text,
+                                        std::vector<Diagnostic>& diagnostics);
 
 /// Imports `text` into `target` all or nothing. The document is validated
 /// against the target first; then it is imported into a scratch sheet that

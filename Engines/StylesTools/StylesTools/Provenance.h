@@ -58,6 +58,8 @@ STYLES_TOOLS_API Resolution ResolveProperty(const Style& style, const PropertyKe
 /// Resolves the end of `path` as Style::GetPathProperty does: through own
 /// substyles, and where the path leaves them, the default of the category
 /// reached through element categories. Throws what GetPathProperty throws.
+/// Unlike GetSubstyleProperty and ListEffectiveValues, it does not take a
+/// substyle the style inherits, so the two can answer differently.
 STYLES_TOOLS_API Resolution ResolvePathProperty(const Style& style, const PropertyPath& path);
 
 /// One effective value of a style, at a path such as "character.fontSize" or

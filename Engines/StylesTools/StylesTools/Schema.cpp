@@ -183,6 +183,12 @@ private:
 // ---------------------------------------------------------------------------
 // Reading a schema. Every check throws a SchemaError naming the member.
 
+// A document's own members beside its categories: a category of that name
+// would make the document hold the name twice.
+bool IsSheetMemberName(const PropertyKey& key) {
+  return key.GetString() == u"version" || key.GetString() == u"id";
+}
+
 struct SchemaReader {
   [[noreturn]] static void Fail(const Text& pointer, const Text& message) {
     throw SchemaError{pointer, message};
@@ -389,6 +395,8 @@ struct SchemaReader {
     if (category.key == StyleCategoryName)
       Fail(AppendPointer(pointer, u"key"),
            u"\"style\" is the category of ordinary styles; set \"styleSubstyle\" instead");
+    if (IsSheetMemberName(category.key))
+      Fail(AppendPointer(pointer, u"key"), u"is a member name of documents, not a category");
     const Json::Value* name = object.Find(u"name");
     category.uiName = name ? AsText(*name, AppendPointer(pointer, u"name")) : key->Get<Text>();
     if (const Json::Value* flag = object.Find(u"styleSubstyle"))
@@ -497,6 +505,11 @@ bool RegisterSchema(const Schema& schema, SchemaRegistration& registration, Sche
   for (std::size_t i = 0; i < schema.categories.size(); ++i) {
     const CategorySchema& category = schema.categories[i];
     const Text pointer = AppendPointer(Text(u"/categories"), i);
+    if (IsSheetMemberName(category.key)) {
+      error = SchemaError{AppendPointer(pointer, u"key"),
+                          u"is a member name of documents, not a category"};
+      return false;
+    }
     if (manager.FindCategory(category.key)) {
       error =
           SchemaError{AppendPointer(pointer, u"key"),

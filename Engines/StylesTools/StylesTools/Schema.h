@@ -118,8 +118,9 @@ struct STYLES_TOOLS_API SchemaRegistration {
 
 /// Registers every category and property of `schema` with the manager and sets
 /// the manager's current version to the schema's. A schema that names a
-/// category the manager already has (or "style", when a category asks for it)
-/// is refused whole: nothing is registered and `error` says why. The first
+/// category the manager already has (or "style", when a category asks for it),
+/// or a category called "version" or "id" (a document's own members), is
+/// refused whole: nothing is registered and `error` says why. The first
 /// registration of a key wins in the manager, so adding to a host's category
 /// could silently keep the host's behaviours; and deregistering the schema
 /// would then remove the host's category.
