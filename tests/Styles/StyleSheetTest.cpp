@@ -12,7 +12,6 @@
 
 #include <algorithm>
 #include <chrono>
-#include <climits>
 #include <filesystem>
 #include <set>
 
@@ -24,7 +23,7 @@ using Names = std::vector<Text>;
 using ZelUtils::Any;
 
 const PropertyKey kParagraph(u"p"), kCharacter(u"c");
-const PropertyKey kSize(u"size"), kFont(u"font"), kTag(u"tag"), kNested(u"nested"), kRuns(u"runs");
+const PropertyKey kSize(u"size"), kFont(u"font"), kTag(u"tag"), kRuns(u"runs");
 
 // Every style made by MakeStyle carries a tag whose destruction is recorded
 // here, which makes ownership visible.
@@ -118,6 +117,15 @@ protected:
     Text text;
     sheet.ExportToString(text, false);
     return text;
+  }
+  // The folder of the documents these tests read, and the text of one.
+  static std::filesystem::path Data() {
+    return std::filesystem::path(__FILE__).parent_path().parent_path() / "data" / "sheet";
+  }
+  static Text Read(const std::filesystem::path& path) {
+    return ZelUtils::TextStreamReader(ZelUtils::FileStream::Open(path.u16string()),
+                                      ZelUtils::TextStream::UTF8)
+        .ReadToEnd();
   }
 
 private:
@@ -223,7 +231,6 @@ TEST_F(StyleSheetTest, RemoveDetachesAndDeleteRepairs) {
   EXPECT_EQ(removed.get(), base);
   EXPECT_TRUE(sheet.RemoveStyle(leaf));
   EXPECT_EQ(leaf->GetParent(), base); // not repaired
-  EXPECT_EQ(sheet.GetStyleNames(), Names{u"Adopted"});
   delete leaf;
 }
 
@@ -237,7 +244,6 @@ TEST_F(StyleSheetTest, QueriesFollowNameOrderAndClearKeepsExternalId) {
   note->SetExternalName(u"Name");
   EXPECT_EQ(sheet.GetStylesByName({u"NOTE", u"missing", u"base"}),
             (std::vector<Style*>{note, base}));
-  EXPECT_EQ(sheet.GetChildStyles(base).size(), 1u); // direct only
   const std::vector<Style*> doomed{base};
   std::vector<Style*> dependents{note};
   sheet.GetDependencies(StyleSpan(doomed, true), dependents); // appends, in name order
@@ -256,50 +262,37 @@ TEST_F(StyleSheetTest, QueriesFollowNameOrderAndClearKeepsExternalId) {
   Add(sheet, u"paragraph 1");
   Add(sheet, u"Note");
   EXPECT_EQ(sheet.GetUnusedStyleName(kParagraph.GetString()), Text(u"Paragraph 2"));
-  EXPECT_EQ(sheet.GetUnusedStyleName(kCharacter.GetString()), Text(u"Character 1"));
   EXPECT_EQ(sheet.GetUnusedStyleName(u"NOTE"), Text(u"NOTE 1"));
 }
 
 // MergeIn walks the target's own index and forgets the source's names; both
 // halves are kept as hosts have always seen them.
 TEST_F(StyleSheetTest, MergeInKeepsBothSheetsSound) {
-  for (const bool replace : {false, true}) {
-    SCOPED_TRACE(replace);
-    DestroyedTags().clear();
-    {
-      StyleSheet target, source;
-      Style* incoming = Add(source, u"In");
-      Style* own = Add(target, u"Own");
-      target.MergeIn(source, replace);
-      EXPECT_TRUE(DestroyedTags().empty());
-      EXPECT_EQ(target.GetStyles(), std::vector<Style*>{own});
-      EXPECT_TRUE(source.GetStyles().empty()); // names forgotten, styles still owned
-      EXPECT_EQ(source.GetStyleName(incoming), Text(u"In"));
-    }
-    EXPECT_EQ(DestroyedTags(), (Names{u"In", u"Own"}));
+  {
+    StyleSheet target, source;
+    Style* incoming = Add(source, u"In");
+    Style* own = Add(target, u"Own");
+    target.MergeIn(source, true);
+    EXPECT_TRUE(DestroyedTags().empty());
+    EXPECT_EQ(target.GetStyles(), std::vector<Style*>{own});
+    EXPECT_TRUE(source.GetStyles().empty()); // names forgotten, styles still owned
+    EXPECT_EQ(source.GetStyleName(incoming), Text(u"In"));
   }
+  EXPECT_EQ(DestroyedTags(), (Names{u"In", u"Own"}));
 }
 
 TEST_F(StyleSheetTest, CopyContentsFromCopiesDeeplyAndTakesVersion) {
-  struct Context : IStyleSheetDuplicationContext {
-    bool OnStyleDuplicated(Style* style, int) override {
-      seen.push_back(style);
-      return false;
-    }
-    std::vector<Style*> seen;
-  } context;
   StyleSheet source, copy;
   source.SetVersion(3);
   Style* base = Add(source, u"Base");
   base->SetProperty(kSize, 9.0);
   Add(source, u"Body", base);
   Add(copy, u"Old");
-  copy.CopyContentsFrom(source, &context);
+  copy.CopyContentsFrom(source, nullptr);
   EXPECT_EQ(DestroyedTags(), Names{u"Old"});
   EXPECT_EQ(copy.GetVersion(), 3);
   const std::vector<Style*> styles = copy.GetStyles();
   ASSERT_EQ(styles.size(), 2u);
-  EXPECT_EQ(context.seen, styles);
   EXPECT_EQ(styles[1]->GetParent(), styles[0]);
   EXPECT_NE(styles[0], base);
   EXPECT_EQ(styles[1]->GetProperty(kSize).Get<double>(), 9.0);
@@ -308,24 +301,7 @@ TEST_F(StyleSheetTest, CopyContentsFromCopiesDeeplyAndTakesVersion) {
   EXPECT_EQ(copy.GetVersion(), -5);
 }
 
-TEST_F(StyleSheetTest, DocumentVersionAndIdRules) {
-  struct Case {
-    const char16_t* document;
-    int version;
-    const char16_t* exported;
-  };
-  for (const Case& c :
-       {Case{uR"({"version": 3.9})", 3, uR"({"version":3})"},
-        Case{uR"({"version": -2.5})", -2, u"{}"}, Case{uR"({"version": "3"})", 0, u"{}"},
-        Case{uR"({"Version": 3})", 0, u"{}"},
-        Case{uR"({"version": 1e300})", INT_MAX, uR"({"version":2147483647})"},
-        Case{uR"({"version": -1e300})", INT_MIN, u"{}"}}) {
-    SCOPED_TRACE(c.version);
-    StyleSheet sheet;
-    EXPECT_TRUE(sheet.ImportFromString(c.document, true));
-    EXPECT_EQ(sheet.GetVersion(), c.version);
-    EXPECT_EQ(Export(sheet), Text(c.exported));
-  }
+TEST_F(StyleSheetTest, DocumentIdIsTakenOnlyBySheetWithOne) {
   // Only a sheet with an ID takes the document's; it is applied in both
   // passes, so a style read gets the ID in force where its category stands.
   const Text document = uR"({"id": "B", "p": {"P": {"id": "own"}}, "id": "C"})";
@@ -364,45 +340,6 @@ TEST_F(StyleSheetTest, ImportReplaceDecidesWhoWins) {
     EXPECT_EQ(x->GetProperty(kSize).Get<double>(), 11.0);
     EXPECT_EQ(x->GetProperty(kFont).Get<Text>(), Text(u"Mono"));
   }
-}
-
-// Parents are found whatever the order of the document and the letter case
-// of the name, across categories, through the host's renames and not to
-// styles it skips. An "inherits" is refused exactly when, as the document is
-// read, it would make a style its own ancestor; of several in a style the last
-// that holds wins. The same name in two categories is one style.
-TEST_F(StyleSheetTest, ImportLinksParentsAndRefusesCycles) {
-  WImportStyleInfo& info = GetStyleManager().GetImportStyleInfo();
-  info.names.insert(u"Skipped");
-  info.renames.emplace(u"Old", u"Base");
-  const std::pair<const char16_t*, const char16_t*> cases[] = {
-      // A document, then "style:parent" for each style, in name order.
-      {uR"({"p": {"Child": {"inherits": "base"}, "Base": {}, "A": {"inherits": "Skipped"},
-             "Skipped": {}, "B": {"inherits": "Old"}}, "c": {"Strong": {"inherits": "BASE"}}})",
-       u"A: B:Base Base: Child:Base Skipped: Strong:Base"},
-      {uR"({"p": {"A": {"inherits": "B"}, "B": {"inherits": "C"}, "C": {"inherits": "A"}}})",
-       u"A:B B:C C:"},
-      {uR"({"p": {"C": {"inherits": "A"}, "B": {"inherits": "C"}, "A": {"inherits": "B"}}})",
-       u"A: B:C C:A"},
-      {uR"({"p": {"A": {"inherits": "A"}, "B": {"inherits": "Z"}}})", u"A: B:"},
-      {uR"({"p": {"A": {"inherits": "B", "inherits": "C"}, "B": {}, "C": {"inherits": "B"}}})",
-       u"A:C B: C:B"},
-      {uR"({"p": {"A": {"inherits": "B", "inherits": "A"}, "B": {}}})", u"A:B B:"},
-      {uR"({"p": {"A": {"inherits": "B"}}, "c": {"B": {"inherits": "a"}, "C": {"inherits": "b"}}})",
-       u"A:B B: C:B"},
-      {uR"({"p": {"A": {}, "B": {"inherits": "A"}}, "c": {"A": {"inherits": "B"}, "B": {"inherits": "C"}, "C": {}}})",
-       u"A: B:C C:"},
-  };
-  for (const auto& [document, expected] : cases) {
-    SCOPED_TRACE(Text(document).GetStdString().size());
-    StyleSheet sheet;
-    ASSERT_TRUE(sheet.ImportFromString(document, true));
-    Text parents;
-    for (const Style* style : sheet.GetStyles())
-      parents += (parents.IsEmpty() ? u"" : u" ") + sheet.GetStyleName(style) + u":" +
-                 sheet.GetStyleName(style->GetParent());
-    EXPECT_EQ(parents, Text(expected));
-  }
   // A style of the sheet that followed a replaced one cannot become its
   // heir's parent.
   StyleSheet sheet;
@@ -421,7 +358,7 @@ TEST_F(StyleSheetTest, ImportLinksParentsAndRefusesCycles) {
 // eighth of their size: time must grow about linearly.
 TEST_F(StyleSheetTest, HostileDocuments) {
   enum class Outcome { Accepted, Rejected, Throws };
-  const auto exercise = [](const Text& document) {
+  const auto exercise = [](const Text& document, Text& imported) {
     StyleSheet sheet;
     sheet.AddStyle(u"Keep", MakeStyle(u"keep"), false);
     const Text before = Export(sheet);
@@ -432,13 +369,18 @@ TEST_F(StyleSheetTest, HostileDocuments) {
     } catch (const std::exception&) {
     }
     EXPECT_EQ(StringPool::Get().GetSize(), pooled);
+    imported = Export(sheet);
+    JsonValue tree{Json::Object()}; // the document's tree gives the same text
+    sheet.ExportJson(tree, false);
+    EXPECT_EQ(Json::ValueToString(tree, false), imported);
     if (outcome == Outcome::Rejected) {
-      EXPECT_EQ(Export(sheet), before);
+      EXPECT_EQ(imported, before);
       EXPECT_EQ(sheet.GetVersion(), 7);
     }
     std::set<const Style*> acyclic; // styles whose ancestors end
     const std::vector<Style*> styles = sheet.GetStyles();
     for (const Style* style : styles) {
+      testing::CheckOwnerLinks(*style);
       std::vector<const Style*> line;
       for (; style && !acyclic.count(style) && line.size() <= styles.size();
            style = style->GetParent())
@@ -448,13 +390,12 @@ TEST_F(StyleSheetTest, HostileDocuments) {
     }
     // Styles that an exception left without a category are written under ""
     // and not read back; one more round trip must then change nothing.
-    Text text = Export(sheet);
+    Text text = imported;
     for (int round = outcome == Outcome::Throws ? 0 : 1; round < 2; ++round) {
       StyleSheet copy;
       EXPECT_TRUE(copy.ImportFromString(text, true));
-      const Text previous = text;
+      EXPECT_TRUE(round == 0 || Export(copy) == text);
       text = Export(copy);
-      EXPECT_TRUE(round == 0 || text == previous);
     }
     // Every other style goes; up to 32 of the others are watched. A style the
     // sheet lists as dependent, and only such a style, sees the dependency itself.
@@ -498,107 +439,75 @@ TEST_F(StyleSheetTest, HostileDocuments) {
     return outcome;
   };
 
+  // Where a document has a sibling ".expected" file, that is the sheet's
+  // export right after the import, the host skipping "Skipped" and renaming
+  // "Old" to "Base".
+  WImportStyleInfo& info = GetStyleManager().GetImportStyleInfo();
+  info.names.insert(u"Skipped");
+  info.renames.emplace(u"Old", u"Base");
   using Clock = std::chrono::steady_clock;
-  const std::filesystem::path data =
-      std::filesystem::path(__FILE__).parent_path().parent_path() / "data" / "sheet";
-  int files = 0;
+  int documents = 0, expectations = 0;
+  Text imported;
   for (const auto& [folder, expected] :
        {std::pair{"accepted", Outcome::Accepted}, std::pair{"rejected", Outcome::Rejected},
         std::pair{"throws", Outcome::Throws}}) {
-    for (const auto& entry : std::filesystem::directory_iterator(data / folder)) {
+    for (const auto& entry : std::filesystem::directory_iterator(Data() / folder)) {
+      if (entry.path().extension() != ".json")
+        continue;
       SCOPED_TRACE(entry.path().string());
-      ++files;
-      ZelUtils::TextStreamReader reader(ZelUtils::FileStream::Open(entry.path().u16string()),
-                                        ZelUtils::TextStream::UTF8);
-      const Text text = reader.ReadToEnd();
+      ++documents;
+      const Text text = Read(entry.path());
       // An eighth of the size first, twice, then the full size: the bound
       // allows for caches that the larger documents outgrow, not for time
       // growing with the square of the size.
       const bool sized = text.GetView().find(u'$') != std::u16string_view::npos;
       Clock::duration least = Clock::duration::max();
       for (int run = 0; sized && run < 2; ++run) {
-        const Text eighth = Expand(text.GetView(), 8);
         const Clock::time_point begin = Clock::now();
-        exercise(eighth);
+        exercise(Expand(text.GetView(), 8), imported);
         least = std::min(least, Clock::now() - begin);
       }
-      const Text document = Expand(text.GetView());
       const Clock::time_point start = Clock::now();
-      EXPECT_EQ(exercise(document), expected);
+      EXPECT_EQ(exercise(Expand(text.GetView()), imported), expected);
       if (sized) {
         EXPECT_LT(Clock::now() - start, 48 * least + std::chrono::seconds(1));
       }
+      if (std::filesystem::exists(
+              std::filesystem::path(entry.path()).replace_extension(".expected"))) {
+        ++expectations;
+        EXPECT_EQ(imported,
+                  Read(std::filesystem::path(entry.path()).replace_extension(".expected")).Trim());
+      }
     }
   }
-  EXPECT_GE(files, 30);
+  EXPECT_GE(documents, 48);
+  EXPECT_GE(expectations, 14);
   // UTF-8 cannot carry a lone surrogate.
-  EXPECT_EQ(exercise(u"{\"p\": {\"\xD800\": {}}}"), Outcome::Rejected);
+  EXPECT_EQ(exercise(u"{\"p\": {\"\xD800\": {}}}", imported), Outcome::Rejected);
 }
 
-// Styles inheriting within and across categories, with external and
-// non-ASCII names and substyles that name sheet styles as parents, survive
-// export and import through a string, the document's tree and a stream; the
-// substyles' parents are resolved on import, and their values baked in when
-// those styles are deleted.
-TEST_F(StyleSheetTest, RoundTripsKeepTextValuesAndSubstyleParents) {
-  StyleSheet sheet, copy, streamed;
-  Style* strong = Add(sheet, u"Strong", nullptr, kCharacter);
-  strong->SetProperty(kSize, 20.0);
-  Style* base = Add(sheet, u"Base", strong);
-  base->SetExternalName(u"external");
-  PropertyPath path{kCharacter};
-  for (int depth = 0; depth < 5; ++depth, path.push_back(kNested))
-    base->SetPathProperty(MakePath(path, kFont), Text::FormatInternal("font %d", depth));
-  base->GetSubstyle(kCharacter, false)->SetParent(strong);
-  Style run(strong, kCharacter);
-  run.SetPathProperty({kNested, kFont}, Text(u"Mono"));
-  Add(sheet, u"\u00dcberschrift", base)->SetProperty(kRuns, std::vector<Style*>{&run, &run});
-
-  const Text text = Export(sheet);
-  JsonValue tree{Json::Object()};
-  sheet.ExportJson(tree, false);
-  EXPECT_EQ(Json::ValueToString(tree, false), text);
-  ZelUtils::Stream stream = ZelUtils::MemoryStream::Create();
-  ASSERT_TRUE(sheet.Export(stream));
-  ZelUtils::Stream reader =
-      ZelUtils::MemoryStream::FromBytes(ZelUtils::MemoryStream::GetBytes(stream));
-  ASSERT_TRUE(streamed.Import(reader, true));
-  EXPECT_EQ(Export(streamed), text);
-  ASSERT_TRUE(copy.ImportFromString(text, true));
-  EXPECT_EQ(Export(copy), text);
-  for (const Style* style : sheet.GetStyles()) {
-    const Style* read = copy.GetStyle(sheet.GetStyleName(style));
-    EXPECT_EQ(copy.GetStyleName(read->GetParent()), sheet.GetStyleName(style->GetParent()));
-    EXPECT_EQ(read->GetExternalName(), style->GetExternalName());
-    for (const PropertyKey& key : {kSize, kFont, kTag})
-      EXPECT_TRUE(read->GetProperty(key) == style->GetProperty(key));
-  }
-  ZelUtils::Stream garbage = ZelUtils::MemoryStream::FromBytes("\xff\xfe\x00{");
-  EXPECT_FALSE(streamed.Import(garbage, true));
-  ZelUtils::Stream unusable;
-  EXPECT_FALSE(sheet.Export(unusable));
-
-  Style* const character = copy.GetStyle(u"Base")->GetSubstyle(kCharacter, false);
-  const Style* body = copy.GetStyle(u"\u00fcberschrift");
+// Substyles name sheet styles as parents: the names are resolved on import
+// (the document's .expected file pins what is written back), and the values
+// baked in when those styles are deleted.
+TEST_F(StyleSheetTest, SubstylesOutliveDeletedParents) {
+  StyleSheet sheet;
+  ASSERT_TRUE(sheet.ImportFromString(
+      Read(Data() / "accepted" / "substyles-naming-sheet-styles.json"), true));
+  Style* const character = sheet.GetStyle(u"Base")->GetSubstyle(kCharacter, false);
+  const Style* body = sheet.GetStyle(u"\u00fcberschrift");
   const std::vector<Style*> runs = body->GetProperty(kRuns).Get<std::vector<Style*>>();
   ASSERT_EQ(runs.size(), 2u);
   for (const Style* substyle : {character, runs[0], runs[1]})
-    EXPECT_EQ(substyle->GetParent(), copy.GetStyle(u"Strong"));
-  std::vector<Style*> doomed{copy.GetStyle(u"Strong")};
-  copy.DeleteStyles(StyleSpan(doomed, true));
+    EXPECT_EQ(substyle->GetParent(), sheet.GetStyle(u"Strong"));
+  std::vector<Style*> doomed{sheet.GetStyle(u"Strong")};
+  sheet.DeleteStyles(StyleSpan(doomed, true));
   for (const Style* substyle : {character, runs[0], runs[1]}) {
     EXPECT_EQ(substyle->GetParent(), nullptr);
     EXPECT_EQ(substyle->GetProperty(kSize).Get<double>(), 20.0);
   }
   EXPECT_EQ(body->GetSubstyle(kCharacter, true), character);
-  EXPECT_EQ(testing::CheckOwnerLinks(*copy.GetStyle(u"Base")), 5);
+  EXPECT_EQ(testing::CheckOwnerLinks(*sheet.GetStyle(u"Base")), 5);
   EXPECT_EQ(testing::CheckOwnerLinks(*body), 4);
-
-  // Deep but within the nesting limit: every level is read and linked.
-  StyleSheet deep;
-  ASSERT_TRUE(
-      deep.ImportFromString(Expand(uR"({"c": {"C": $500[{"nested": $]{}$500[}$]}})"), true));
-  EXPECT_EQ(testing::CheckOwnerLinks(*deep.GetStyle(u"C")), 500);
 }
 
 } // namespace
