@@ -115,8 +115,8 @@ FAULTS = [
     # Sheets
     ("cycle-refusal", LIBRARY, "inverted condition: import accepts a parent that closes a cycle",
      "if (FindRoot(above) == node) {", "if (FindRoot(above) != node) {"),
-    ("cycle-self", LIBRARY, "dropped check: import lets a style inherit from itself",
-     "if (child == parent)", "if (false)"),
+    ("cycle-forgets-link", LIBRARY, "missing call: a refused link also drops the style's old parent",
+     "Attach(node, Find(current));", "(void)current;"),
     ("delete-no-repair", LIBRARY, "missing call: deleting styles leaves children pointing at them",
      "      style->RemoveDependency(doomed, true);\n  for (Style* style : styles) {",
      "      (void)style;\n  for (Style* style : styles) {"),

@@ -42,6 +42,7 @@ TEST_F(FolderPresetManagerTest, SetsRoundTripThroughAFreshManager) {
     ASSERT_TRUE(manager.Save(u"Empty"));
   }
   WriteFile(".tmp-1-0-0123456789abcdef", "{}"); // a live writer's file is no set
+  WriteFile("Notes.json", "{}");                 // nor a file of another extension
   FolderPresetManager fresh(Folder());
   EXPECT_EQ(fresh.GetPresetSetNames(), (Names{u"Body", u"Empty"}));
   EXPECT_EQ(fresh.GetPresetNames(u"Body").size(), presetNames.size());

@@ -147,6 +147,11 @@ TEST_F(ProvenanceTest, ResolutionAgreesWithTheCoreOnGeneratedSheets) {
     ASSERT_TRUE(sheet.ImportFromString(U16(RandomSheet(random, 12)), true));
     for (Style* top : sheet.GetStyles()) {
       ForEachStyle(*top, [&](const Style& style) {
+        if (const Style* owner = style.GetOwner()) { // a substyle reads as its owner's path
+          EXPECT_EQ(U8(DescribeStyle(sheet, &style)),
+                    U8(DescribeStyle(sheet, owner) + u" \u203A " +
+                       style.GetOwnerPropertyKey().GetString()));
+        }
         for (const PropertyKey& key : style.GetCategory()->GetPropertyOrder()) {
           Resolution resolution;
           const std::string expected = Outcome([&] { return &style.GetProperty(key); });

@@ -136,6 +136,7 @@ TEST_F(StockBehaviourTest, PoliciesReadTextAndTypeChecksGuardBounds) {
       {u"character", u"fontSize", u"big", false, false},
       {u"character", u"tracking", u"-1000", true, true},
       {u"character", u"tracking", u"2000", true, false},
+      {u"character", u"tracking", u"1000", true, true}, // the maximum itself
       {u"character", u"tracking", u"1.5", false, false},
       {u"character", u"bold", u"true", true, true},
       {u"character", u"bold", u"yes", false, false},

@@ -39,14 +39,14 @@ using Styles::StyleSheet;
 using Styles::Tools::Diagnostic;
 using Styles::Tools::Severity;
 
+std::string DisplayName(const std::string& path) { return path == "-" ? "<stdin>" : path; }
+
 namespace {
 
 Styles::Tools::SchemaRegistration& Registration() {
   static Styles::Tools::SchemaRegistration registration;
   return registration;
 }
-
-std::string DisplayName(const std::string& path) { return path == "-" ? "<stdin>" : path; }
 
 // A document's file name without its folder, to title a page or graph.
 std::string TitleOf(const std::string& path) {

@@ -33,6 +33,9 @@ bool RegisterSchemaFile(const std::string& path, int& status);
 // Takes out what RegisterSchemaFile registered, once no style is left.
 void DeregisterSchemaFile();
 
+// How messages name the file `path`: "<stdin>" for "-".
+std::string DisplayName(const std::string& path);
+
 // How a command takes what reading a document cannot keep: a read-only one
 // ignores it, a rewriting one refuses it or (with --lossy) warns.
 enum class Loss { Ignore, Refuse, Accept };

@@ -31,8 +31,6 @@ Styles::Tools::SchemaRegistration& Registration() {
   return registration;
 }
 
-std::string DisplayName(const std::string& path) { return path == "-" ? "<stdin>" : path; }
-
 bool ReadBytes(const std::string& path, std::string& bytes) {
   std::string reason;
   return StylesCommand::ReadBytes(path, bytes, reason);
