@@ -147,10 +147,11 @@ TEST_F(ProvenanceTest, ResolutionAgreesWithTheCoreOnGeneratedSheets) {
     ASSERT_TRUE(sheet.ImportFromString(U16(RandomSheet(random, 12)), true));
     for (Style* top : sheet.GetStyles()) {
       ForEachStyle(*top, [&](const Style& style) {
-        if (const Style* owner = style.GetOwner()) { // a substyle reads as its owner's path
+        // A substyle reads as its owner's path (list elements have none).
+        const Style* owner = style.GetOwner();
+        if (const Text above = owner ? DescribeStyle(sheet, owner) : Text(); !above.IsEmpty()) {
           EXPECT_EQ(U8(DescribeStyle(sheet, &style)),
-                    U8(DescribeStyle(sheet, owner) + u" \u203A " +
-                       style.GetOwnerPropertyKey().GetString()));
+                    U8(above + u" \u203A " + style.GetOwnerPropertyKey().GetString()));
         }
         for (const PropertyKey& key : style.GetCategory()->GetPropertyOrder()) {
           Resolution resolution;
