@@ -1,5 +1,7 @@
 #include <Internal/MemberPositions.h>
 
+#include <Internal/ToolsSupport.h>
+
 #include <algorithm>
 #include <string>
 #include <tuple>
@@ -52,18 +54,6 @@ void ReadString(std::u16string_view text, std::size_t& i, std::u16string* decode
     }
     if (decoded)
       decoded->push_back(c);
-  }
-}
-
-void AppendToken(std::u16string& pointer, std::u16string_view token) {
-  pointer += u'/';
-  for (const char16_t c : token) {
-    if (c == u'~')
-      pointer += u"~0";
-    else if (c == u'/')
-      pointer += u"~1";
-    else
-      pointer += c;
   }
 }
 
@@ -136,7 +126,7 @@ void LocateMembers(const Text& text, std::vector<Diagnostic>& diagnostics) {
       ReadString(view, i, expectKey ? &key : nullptr);
       if (expectKey) {
         pointer.resize(open.back().base);
-        AppendToken(pointer, key);
+        detail::AppendPointerToken(pointer, key);
         record(start);
         expectKey = false;
       }

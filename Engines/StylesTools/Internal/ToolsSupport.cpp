@@ -6,9 +6,7 @@ namespace Styles {
 namespace Tools {
 namespace detail {
 
-Text AppendPointer(const Text& base, std::u16string_view token) {
-  std::u16string pointer = base.GetStdString();
-  pointer.reserve(pointer.size() + token.size() + 1);
+void AppendPointerToken(std::u16string& pointer, std::u16string_view token) {
   pointer += u'/';
   for (const char16_t c : token) {
     if (c == u'~')
@@ -18,6 +16,12 @@ Text AppendPointer(const Text& base, std::u16string_view token) {
     else
       pointer += c;
   }
+}
+
+Text AppendPointer(const Text& base, std::u16string_view token) {
+  std::u16string pointer = base.GetStdString();
+  pointer.reserve(pointer.size() + token.size() + 1);
+  AppendPointerToken(pointer, token);
   return Text(std::move(pointer));
 }
 

@@ -8,6 +8,7 @@
 
 #include <cstddef>
 #include <string>
+#include <string_view>
 
 namespace Styles {
 class BaseStyleProperty;
@@ -21,6 +22,8 @@ using Text = ZelStringT<char16_t>;
 inline Text Widen(const std::string& text) { return Text(ZelPlatform::Utf8ToUtf16(text)); }
 
 // `base` followed by one JSON Pointer token ("~" as "~0", "/" as "~1").
+// Appends "/" and `token`, escaped as a JSON Pointer token ("~0", "~1").
+void AppendPointerToken(std::u16string& pointer, std::u16string_view token);
 Text AppendPointer(const Text& base, std::u16string_view token);
 Text AppendPointer(const Text& base, std::size_t index);
 
