@@ -14,7 +14,7 @@ PREFIX         ?= /usr/local
 # Debian packages the build needs; the reference needs only its own, which
 # `make docs` (or `make deps DOCS=1`) installs.
 PACKAGES := cmake make g++ pkg-config rapidjson-dev libicu-dev libgtest-dev libbenchmark-dev libcli11-dev \
-            libpugixml-dev libzip-dev python3-docx
+            libpugixml-dev libzip-dev python3 python3-docx
 DOCS_PACKAGES := doxygen
 # And those that fuzzing needs, installed only with FUZZ=1 (`make fuzz` asks).
 FUZZ_PACKAGES := clang libfuzzer-14-dev libclang-rt-14-dev
@@ -102,11 +102,18 @@ test-ratio:
 mutate: deps
 	python3 tools/mutate.py
 
+# The Google Benchmark programs, then the tracked figures as one table: the
+# sheet's (BenchmarkStyleSheet's summary) and the styles command's on a
+# generated 1M-style document (tools/bench-command.py).
 bench: deps
 	cmake -S . -B $(BENCH_BUILD_DIR) -DCMAKE_BUILD_TYPE=Release -DSTYLES_BUILD_BENCHMARKS=ON \
 	  -DSTYLES_BUILD_TESTS=OFF
 	cmake --build $(BENCH_BUILD_DIR) -j $(JOBS)
-	for b in $(BENCH_BUILD_DIR)/benchmarks/Benchmark*; do [ -x "$$b" ] && "$$b" || exit 1; done
+	for b in $(BENCH_BUILD_DIR)/benchmarks/Benchmark*; do \
+	  [ "$${b##*/}" = BenchmarkStyleSheet ] || { [ -x "$$b" ] && "$$b"; } || exit 1; \
+	done
+	$(BENCH_BUILD_DIR)/benchmarks/BenchmarkStyleSheet
+	python3 tools/bench-command.py $(BENCH_BUILD_DIR)
 
 # Builds the libFuzzer targets with clang, ASan and UBSan at -O1, and runs each
 # for FUZZ_SECONDS on a copy of its seed corpus; the document targets take
