@@ -17,6 +17,7 @@
 #include <random>
 #include <stdexcept>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace Styles {
@@ -312,6 +313,8 @@ TEST_F(DiagnosticsTest, SelectingAStyleKeepsWhatItDependsOn) {
       U8(Json::ValueToString(Json::Value(part), false)),
       R"({"version":1,"paragraph":{"A":{"inherits":"b"},"B":{"character":{"inherits":"Em"}}},)"
       R"("character":{"Em":{"inherits":"Base"},"base":{}}})");
+  // Moving the part out of the document gives the same part.
+  EXPECT_EQ(SelectStyles(std::move(value.Get<Json::Object>()), {u"a"}), part);
 }
 
 } // namespace

@@ -62,8 +62,10 @@ bool IsStandardOutput(const std::string& path) {
 }
 
 // Reads a document's text; `diagnostics` gets an error for bytes that are not
-// UTF-8 (they are read as U+FFFD).
-int ReadDocument(const std::string& path, Text& text, std::vector<Diagnostic>& diagnostics) {
+// UTF-8 (they are read as U+FFFD). With `keptBytes`, the bytes are kept there
+// too: half the size of the text, for a caller that lets the text go early.
+int ReadDocument(const std::string& path, Text& text, std::vector<Diagnostic>& diagnostics,
+                 std::string* keptBytes = nullptr) {
   std::string bytes, reason;
   if (!ReadBytes(path, bytes, reason)) {
     Output::Error(DisplayName(path), "cannot be read: " + reason);
@@ -71,8 +73,17 @@ int ReadDocument(const std::string& path, Text& text, std::vector<Diagnostic>& d
   }
   if (std::optional<Diagnostic> invalid = FindInvalidUtf8(bytes))
     diagnostics.push_back(std::move(*invalid));
+  if (keptBytes)
+    *keptBytes = bytes;
   text = DecodeUtf8(std::move(bytes));
   return kSuccess;
+}
+
+// Whether LocateDiagnostics has a diagnostic to place.
+bool NeedsPositions(const std::vector<Diagnostic>& diagnostics) {
+  return std::any_of(diagnostics.begin(), diagnostics.end(), [](const Diagnostic& d) {
+    return d.line == 0 && !d.pointer.IsEmpty();
+  });
 }
 
 // Whether a command goes on after reading a document into a sheet, given the
@@ -108,53 +119,66 @@ int Conclude(const std::string& path, std::vector<Diagnostic> diagnostics, bool 
 
 } // namespace
 
-int LoadSheet(const std::string& path, StyleSheet& sheet, Loss loss,
-              std::vector<Diagnostic>* warnings) {
-  if (IsWordDocument(path))
-    return LoadWordSheet(path, sheet, warnings);
+namespace {
+
+// Reads the JSON document `path` into `sheet` all or nothing; with `style`,
+// only what that style depends on, so that a large document answers for one
+// style at the cost of that style alone. Each form of the document is let go
+// once the next is made (text, tree, styles): the bytes, half the text, stay
+// to place diagnostics.
+int LoadJson(const std::string& path, StyleSheet& sheet, Loss loss, const std::string* style) {
   Text text;
+  std::string bytes;
   std::vector<Diagnostic> diagnostics;
-  if (const int status = ReadDocument(path, text, diagnostics))
+  if (const int status = ReadDocument(path, text, diagnostics, &bytes))
     return status;
+  Json::Object document;
+  {
+    Json::Value value;
+    Text parseError;
+    if (!Json::Parse(text, value, parseError) || !value.Is<Json::Object>()) {
+      // The full check says where the text goes wrong.
+      const std::vector<Diagnostic> found = Styles::Tools::ValidateDocument(text);
+      diagnostics.insert(diagnostics.end(), found.begin(), found.end());
+      return Conclude(path, std::move(diagnostics), false, loss);
+    }
+    const Text released(std::move(text));
+    if (!style) {
+      document = std::move(value.Get<Json::Object>());
+    } else {
+      Json::Object selected =
+          Styles::Tools::SelectStyles(std::move(value.Get<Json::Object>()), {FromUtf8(*style)});
+      // Other members of the sheet belong to no style, and what they hold is
+      // no loss to the style's answer.
+      for (Json::Member& member : selected)
+        if (member.value.Is<Json::Object>() || member.name == u"version" || member.name == u"id")
+          document.AddValue(std::move(member.name), std::move(member.value));
+    }
+  }
   std::vector<Diagnostic> found;
-  const bool imported = Styles::Tools::ImportChecked(sheet, text, true, &found);
+  const bool imported = Styles::Tools::ImportChecked(sheet, std::move(document), true, &found);
+  if (NeedsPositions(found))
+    Styles::Tools::LocateDiagnostics(DecodeUtf8(std::move(bytes)), found);
   diagnostics.insert(diagnostics.end(), found.begin(), found.end());
   return Conclude(path, std::move(diagnostics), imported, loss);
+}
+
+// LoadSheet for the style `name` and what it depends on.
+int LoadStyle(const std::string& path, const std::string& name, StyleSheet& sheet,
+              Loss loss = Loss::Ignore) {
+  return IsWordDocument(path) ? LoadWordSheet(path, sheet, nullptr)
+                              : LoadJson(path, sheet, loss, &name);
+}
+
+} // namespace
+
+int LoadSheet(const std::string& path, StyleSheet& sheet, Loss loss,
+              std::vector<Diagnostic>* warnings) {
+  return IsWordDocument(path) ? LoadWordSheet(path, sheet, warnings)
+                              : LoadJson(path, sheet, loss, nullptr);
 }
 
 namespace {
-
-// Reads from `path` only what the style `name` depends on, all or nothing:
-// a large document answers for one style at the cost of that style alone.
-int LoadStyle(const std::string& path, const std::string& name, StyleSheet& sheet,
-              Loss loss = Loss::Ignore) {
-  if (IsWordDocument(path))
-    return LoadWordSheet(path, sheet, nullptr);
-  Text text;
-  std::vector<Diagnostic> diagnostics;
-  if (const int status = ReadDocument(path, text, diagnostics))
-    return status;
-  Json::Value value;
-  Text parseError;
-  if (!Json::Parse(text, value, parseError) || !value.Is<Json::Object>()) {
-    // The full check says where the text goes wrong.
-    const std::vector<Diagnostic> found = Styles::Tools::ValidateDocument(text);
-    diagnostics.insert(diagnostics.end(), found.begin(), found.end());
-    return Conclude(path, std::move(diagnostics), false, loss);
-  }
-  Json::Object selected = Styles::Tools::SelectStyles(value.Get<Json::Object>(), {FromUtf8(name)});
-  // Other members of the sheet belong to no style, and what they hold is no
-  // loss to the style's answer.
-  Json::Object part;
-  for (Json::Member& member : selected)
-    if (member.value.Is<Json::Object>() || member.name == u"version" || member.name == u"id")
-      part.AddValue(std::move(member.name), std::move(member.value));
-  std::vector<Diagnostic> found;
-  const bool imported = Styles::Tools::ImportChecked(sheet, part, true, &found);
-  Styles::Tools::LocateDiagnostics(text, found);
-  diagnostics.insert(diagnostics.end(), found.begin(), found.end());
-  return Conclude(path, std::move(diagnostics), imported, loss);
-}
 
 const Style* FindStyle(const StyleSheet& sheet, const std::string& document,
                        const std::string& name) {

@@ -503,49 +503,11 @@ const Text& StandInMark() {
   return mark;
 }
 
-} // namespace
-
-bool HasErrors(const std::vector<Diagnostic>& diagnostics) {
-  return std::any_of(diagnostics.begin(), diagnostics.end(),
-                     [](const Diagnostic& d) { return d.severity == Severity::Error; });
-}
-
-std::vector<Diagnostic> ValidateDocument(const Text& text) {
-  std::vector<Diagnostic> diagnostics;
-  Json::Value value;
-  if (const Json::Object* document = ParseDocument(text, value, diagnostics)) {
-    diagnostics = ValidateDocument(*document);
-    detail::LocateMembers(text, diagnostics);
-  }
-  return diagnostics;
-}
-
-std::vector<Diagnostic> ValidateDocument(const Json::Object& document, const StyleSheet* target,
-                                         bool replace) {
-  return Validator(target, replace).Run(document);
-}
-
-void LocateDiagnostics(const Text& text, std::vector<Diagnostic>& diagnostics) {
-  detail::LocateMembers(text, diagnostics);
-}
-
-bool ImportChecked(StyleSheet& target, const Text& text, bool replace,
-                   std::vector<Diagnostic>* diagnostics) {
-  std::vector<Diagnostic> found;
-  Json::Value value;
-  if (Json::Object* document = ParseDocument(text, value, found)) {
-    const bool imported = ImportChecked(target, *document, replace, diagnostics);
-    if (diagnostics)
-      detail::LocateMembers(text, *diagnostics);
-    return imported;
-  }
-  if (diagnostics)
-    *diagnostics = std::move(found);
-  return false;
-}
-
-bool ImportChecked(StyleSheet& target, Json::Object& document, bool replace,
-                   std::vector<Diagnostic>* diagnostics) {
+// ImportChecked on a parsed document; with `release`, the document is let go
+// as soon as the scratch sheet has read it, so that its tree is not held
+// beside both sheets while the new styles move into the target.
+bool ImportParsed(StyleSheet& target, Json::Object& document, bool replace,
+                  std::vector<Diagnostic>* diagnostics, bool release) {
   std::vector<Diagnostic> found;
   const auto finish = [&](bool imported) {
     if (diagnostics)
@@ -591,20 +553,24 @@ bool ImportChecked(StyleSheet& target, Json::Object& document, bool replace,
                                u"reading the document failed; nothing was imported", 0, 0});
     return finish(false);
   }
+  if (release)
+    document = Json::Object();
 
   // Stand-ins still in the scratch sheet map back to their originals; the
   // other styles are the import's. A replaced stand-in was destroyed, and its
   // address may have been reused by a new style, hence the mark.
   std::map<Style*, Style*> toOriginals;
   std::vector<std::pair<Text, Style*>> created;
-  const std::vector<Text> names = scratch.GetStyleNames();
-  const std::vector<Style*> styles = scratch.GetStyles(); // the same order
-  for (std::size_t i = 0; i < names.size(); ++i) {
-    Style* style = styles[i];
-    if (style && standInSet.count(style) && style->GetExternalName() == StandInMark())
-      toOriginals.emplace(style, target.GetStyle(names[i]));
-    else
-      created.emplace_back(names[i], style);
+  {
+    std::vector<Text> names = scratch.GetStyleNames();
+    const std::vector<Style*> styles = scratch.GetStyles(); // the same order
+    for (std::size_t i = 0; i < names.size(); ++i) {
+      Style* style = styles[i];
+      if (style && standInSet.count(style) && style->GetExternalName() == StandInMark())
+        toOriginals.emplace(style, target.GetStyle(names[i]));
+      else
+        created.emplace_back(std::move(names[i]), style);
+    }
   }
   for (auto& [name, style] : created) {
     scratch.RemoveStyle(style);
@@ -635,6 +601,57 @@ bool ImportChecked(StyleSheet& target, Json::Object& document, bool replace,
   target.SetVersion(scratch.GetVersion());
   target.SetExternalID(scratch.GetExternalID());
   return finish(true);
+}
+
+} // namespace
+
+bool HasErrors(const std::vector<Diagnostic>& diagnostics) {
+  return std::any_of(diagnostics.begin(), diagnostics.end(),
+                     [](const Diagnostic& d) { return d.severity == Severity::Error; });
+}
+
+std::vector<Diagnostic> ValidateDocument(const Text& text) {
+  std::vector<Diagnostic> diagnostics;
+  Json::Value value;
+  if (const Json::Object* document = ParseDocument(text, value, diagnostics)) {
+    diagnostics = ValidateDocument(*document);
+    detail::LocateMembers(text, diagnostics);
+  }
+  return diagnostics;
+}
+
+std::vector<Diagnostic> ValidateDocument(const Json::Object& document, const StyleSheet* target,
+                                         bool replace) {
+  return Validator(target, replace).Run(document);
+}
+
+void LocateDiagnostics(const Text& text, std::vector<Diagnostic>& diagnostics) {
+  detail::LocateMembers(text, diagnostics);
+}
+
+bool ImportChecked(StyleSheet& target, const Text& text, bool replace,
+                   std::vector<Diagnostic>* diagnostics) {
+  std::vector<Diagnostic> found;
+  Json::Value value;
+  if (Json::Object* document = ParseDocument(text, value, found)) {
+    const bool imported = ImportChecked(target, std::move(*document), replace, diagnostics);
+    if (diagnostics)
+      detail::LocateMembers(text, *diagnostics);
+    return imported;
+  }
+  if (diagnostics)
+    *diagnostics = std::move(found);
+  return false;
+}
+
+bool ImportChecked(StyleSheet& target, Json::Object& document, bool replace,
+                   std::vector<Diagnostic>* diagnostics) {
+  return ImportParsed(target, document, replace, diagnostics, false);
+}
+
+bool ImportChecked(StyleSheet& target, Json::Object&& document, bool replace,
+                   std::vector<Diagnostic>* diagnostics) {
+  return ImportParsed(target, document, replace, diagnostics, true);
 }
 
 } // namespace Tools

@@ -94,6 +94,11 @@ STYLES_TOOLS_API bool ImportChecked(StyleSheet& target, const ZelStringT<char16_
 /// takes it as non-const).
 STYLES_TOOLS_API bool ImportChecked(StyleSheet& target, Json::Object& document, bool replace,
                                     std::vector<Diagnostic>* diagnostics);
+/// The same, letting go of `document` (left empty) as soon as it has been
+/// read, before the new styles move into the target: a large document and
+/// its styles are then not held twice.
+STYLES_TOOLS_API bool ImportChecked(StyleSheet& target, Json::Object&& document, bool replace,
+                                    std::vector<Diagnostic>* diagnostics);
 
 /// The part of `document` that the styles called `names` (letter case
 /// ignored) depend on: the sheet's own members, and every style member, in
@@ -102,6 +107,11 @@ STYLES_TOOLS_API bool ImportChecked(StyleSheet& target, Json::Object& document, 
 /// Reading it into an empty sheet gives those styles the same effective values
 /// as reading the whole document, at the cost of their dependencies only.
 STYLES_TOOLS_API Json::Object SelectStyles(const Json::Object& document,
+                                           const std::vector<ZelStringT<char16_t>>& names);
+/// The same, moving the part out of `document` instead of copying it; what is
+/// left of `document` is unspecified, and each category's unselected members
+/// are freed as the part is taken, so that a large document is never held twice.
+STYLES_TOOLS_API Json::Object SelectStyles(Json::Object&& document,
                                            const std::vector<ZelStringT<char16_t>>& names);
 
 } // namespace Tools

@@ -10,6 +10,7 @@
 #include <ZelUtils/String.h>
 
 #include <algorithm>
+#include <type_traits>
 #include <unordered_set>
 #include <utility>
 #include <vector>
@@ -20,10 +21,14 @@ namespace Tools {
 using detail::Text;
 
 namespace {
-constexpr char16_t kInherits[] = u"inherits";
-} // namespace
 
-Json::Object SelectStyles(const Json::Object& document, const std::vector<Text>& names) {
+constexpr char16_t kInherits[] = u"inherits";
+
+using Selection = std::unordered_set<const Json::Value*>;
+
+// The style members of `document` (their values) that the styles called
+// `names` depend on.
+Selection SelectMembers(const Json::Object& document, const std::vector<Text>& names) {
   StyleManager& manager = GetStyleManager();
   // Every style member of a registered category, sorted by name ignoring
   // case (one block, not a node per name: documents may be large).
@@ -43,7 +48,7 @@ Json::Object SelectStyles(const Json::Object& document, const std::vector<Text>&
 
   // The names needed, found by following every "inherits" at any depth.
   const WImportStyleInfo& info = manager.GetImportStyleInfo();
-  std::unordered_set<const Json::Value*> selected;
+  Selection selected;
   std::vector<const Json::Value*> pending;
   const auto need = [&](const Text& name) {
     if (info.names.count(name))
@@ -76,23 +81,49 @@ Json::Object SelectStyles(const Json::Object& document, const std::vector<Text>&
     }
   }
 
+  return selected;
+}
+
+// The sheet's own members of `document` and its selected style members, in
+// document order: copies from a const document, else moved out of it, each
+// category let go as soon as its members are taken.
+template <class Document>
+Json::Object Cut(Document& document, const Selection& selected) {
+  constexpr bool kMove = !std::is_const<Document>::value;
+  const auto take = [](auto& item) -> decltype(auto) {
+    if constexpr (kMove)
+      return std::move(item);
+    else
+      return static_cast<const std::remove_reference_t<decltype(item)>&>(item);
+  };
   Json::Object part;
-  for (std::size_t i = 0; i < document.GetSize(); ++i) {
-    const Text& name = document.GetValueName(i);
-    const Json::Value& value = document.GetValue(i);
-    const Json::Object* category = value.GetIf<Json::Object>();
+  for (auto& member : document) {
+    auto* category = member.value.template GetIf<Json::Object>();
     if (!category) {
-      part.AddValue(name, value);
+      part.AddValue(take(member.name), take(member.value));
       continue;
     }
     Json::Object kept;
-    for (std::size_t j = 0; j < category->GetSize(); ++j)
-      if (selected.count(&category->GetValue(j)))
-        kept.AddValue(category->GetValueName(j), category->GetValue(j));
+    for (auto& style : *category)
+      if (selected.count(&style.value))
+        kept.AddValue(take(style.name), take(style.value));
+    if constexpr (kMove)
+      member.value = Json::Value();
     if (!kept.IsEmpty())
-      part.AddValue(name, Json::Value(std::move(kept)));
+      part.AddValue(take(member.name), Json::Value(std::move(kept)));
   }
   return part;
+}
+
+} // namespace
+
+Json::Object SelectStyles(const Json::Object& document, const std::vector<Text>& names) {
+  return Cut(document, SelectMembers(document, names));
+}
+
+Json::Object SelectStyles(Json::Object&& document, const std::vector<Text>& names) {
+  const Selection selected = SelectMembers(document, names);
+  return Cut(document, selected);
 }
 
 } // namespace Tools
