@@ -190,6 +190,8 @@ FAULTS = [
      "if (presets.Save(FromUtf8(set)) && !presets.LastSaveFailed())", "if (presets.Save(FromUtf8(set)))"),
     ("diff-exit-status", COMMAND, "wrong value: a diff with differences exits 0",
      "return differences.empty() ? kSuccess : kNegative;", "return kSuccess;"),
+    ("positions-skipped", COMMAND, "inverted condition: diagnostics read from a document get no line",
+     "return d.line == 0 && !d.pointer.IsEmpty();", "return d.line != 0 && !d.pointer.IsEmpty();"),
     ("stdin-name", COMMAND, "wrong value: standard input is not named as such",
      'return path == "-" ? "<stdin>" : path;', "return path;"),
     ("report-script-escape", COMMAND, "wrong value: the report's data lets \"</script>\" end its script",
