@@ -123,36 +123,51 @@ void ReplaceUnpairedSurrogates(std::u16string_view text, std::u16string& out) {
   }
 }
 
-void FoldCaseUtf16(std::u16string_view text, std::u16string& out) {
-  out.resize(text.size());
-  std::size_t i = 0;
-  for (; i < text.size(); ++i) {
-    const char16_t c = text[i];
-    if (c >= 0x80)
-      break;
-    out[i] = static_cast<char16_t>(FoldAscii(c));
+namespace {
+
+// Appends the full folding of `run`, a text without ASCII units.
+void AppendFoldedRun(std::u16string_view run, std::u16string& out) {
+  std::u16string repaired;
+  if (HasUnpairedSurrogate(run)) {
+    ReplaceUnpairedSurrogates(run, repaired);
+    run = repaired;
   }
-  if (i == text.size())
-    return;
-  // Beyond ASCII, ICU folds the rest (after repairing unpaired surrogates).
-  std::u16string rest;
-  std::u16string_view source = text.substr(i);
-  if (HasUnpairedSurrogate(source)) {
-    ReplaceUnpairedSurrogates(source, rest);
-    source = rest;
+  assert(run.size() <= static_cast<std::size_t>(std::numeric_limits<int32_t>::max() / 3));
+  // Full folding grows a text by at most three times; short runs fold on the stack.
+  char16_t fixed[96];
+  std::u16string grown;
+  char16_t* folded = fixed;
+  if (run.size() * 3 > sizeof fixed / sizeof fixed[0]) {
+    grown.resize(run.size() * 3);
+    folded = grown.data();
   }
-  assert(source.size() <= static_cast<std::size_t>(std::numeric_limits<int32_t>::max() / 3));
-  // Full folding grows a text by at most three times.
-  std::u16string folded(source.size() * 3, u'\0');
   UErrorCode status = U_ZERO_ERROR;
   const int32_t length =
-      u_strFoldCase(folded.data(), static_cast<int32_t>(folded.size()), source.data(),
-                    static_cast<int32_t>(source.size()), U_FOLD_CASE_DEFAULT, &status);
-  out.resize(i);
+      u_strFoldCase(folded, static_cast<int32_t>(run.size() * 3), run.data(),
+                    static_cast<int32_t>(run.size()), U_FOLD_CASE_DEFAULT, &status);
   if (U_FAILURE(status))
-    out.append(source); // cannot happen with a large enough buffer
+    out.append(run); // cannot happen with a large enough buffer
   else
-    out.append(folded.data(), static_cast<std::size_t>(length));
+    out.append(folded, static_cast<std::size_t>(length));
+}
+
+} // namespace
+
+void FoldCaseUtf16(std::u16string_view text, std::u16string& out) {
+  out.clear();
+  out.reserve(text.size());
+  std::size_t i = 0;
+  while (i < text.size()) {
+    for (; i < text.size() && text[i] < 0x80; ++i)
+      out.push_back(static_cast<char16_t>(FoldAscii(text[i])));
+    // Full folding maps each code point on its own, so the runs between
+    // ASCII units fold apart; an ASCII unit never splits a surrogate pair.
+    const std::size_t start = i;
+    while (i < text.size() && text[i] >= 0x80)
+      ++i;
+    if (i > start)
+      AppendFoldedRun(text.substr(start, i - start), out);
+  }
 }
 
 int CompareCodePointOrder(std::u16string_view a, std::u16string_view b) noexcept {
