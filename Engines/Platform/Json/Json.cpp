@@ -407,17 +407,12 @@ public:
 
   // Moves the root to the end of the final arrays; once the reader succeeded.
   void Finish() {
-    m_nodes.push_back(m_open.back().node);
-    m_kinds.push_back(m_open.back().kind);
+    m_nodes.push_back(m_openNodes.back());
+    m_kinds.push_back(m_openKinds.back());
   }
   const char* GetError() const { return m_error; }
 
 private:
-  struct Open {
-    Node node;
-    std::uint8_t kind;
-  };
-
   bool Text(std::uint8_t kind, const Ch* text, SizeType length) {
     const std::size_t quote = m_stream.Tell();
     if (quote < m_source.size() && m_source[quote] == u'"' &&
@@ -436,7 +431,8 @@ private:
     return Push(Node::kNumber, Node{0, static_cast<std::uint32_t>(m_numbers.size() - 1)});
   }
   bool Push(std::uint8_t kind, const Node& node) {
-    m_open.push_back(Open{node, kind});
+    m_openNodes.push_back(node);
+    m_openKinds.push_back(kind);
     return true;
   }
   bool Enter() {
@@ -451,12 +447,11 @@ private:
     if (m_nodes.size() + children > std::numeric_limits<std::uint32_t>::max())
       return Fail("Document too large");
     const Node node{count, static_cast<std::uint32_t>(m_nodes.size())};
-    for (auto open = m_open.end() - static_cast<std::ptrdiff_t>(children); open != m_open.end();
-         ++open) {
-      m_nodes.push_back(open->node);
-      m_kinds.push_back(open->kind);
-    }
-    m_open.resize(m_open.size() - children);
+    const auto from = static_cast<std::ptrdiff_t>(m_openNodes.size() - children);
+    m_nodes.insert(m_nodes.end(), m_openNodes.begin() + from, m_openNodes.end());
+    m_kinds.insert(m_kinds.end(), m_openKinds.begin() + from, m_openKinds.end());
+    m_openNodes.resize(m_openNodes.size() - children);
+    m_openKinds.resize(m_openKinds.size() - children);
     return Push(kind, node);
   }
   bool Fail(const char* message) {
@@ -470,7 +465,8 @@ private:
   std::vector<double>& m_numbers;
   std::vector<Node>& m_nodes;
   std::vector<std::uint8_t>& m_kinds;
-  std::vector<Open> m_open;
+  std::vector<Node> m_openNodes; // the children of open containers, and their kinds
+  std::vector<std::uint8_t> m_openKinds;
   int m_depth = 1;
   const char* m_error = nullptr;
 };

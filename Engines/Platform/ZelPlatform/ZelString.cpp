@@ -5,6 +5,7 @@
 #include <unicode/utf16.h>
 #include <unicode/utf8.h>
 
+#include <algorithm>
 #include <cassert>
 #include <cstdarg>
 #include <cstdint>
@@ -125,8 +126,11 @@ void ReplaceUnpairedSurrogates(std::u16string_view text, std::u16string& out) {
 
 namespace {
 
-// Appends the full folding of `run`, a text without ASCII units.
-void AppendFoldedRun(std::u16string_view run, std::u16string& out) {
+// Writes the full folding of `run`, a text without ASCII units, into `out`
+// from `at`, growing `out` so that `rest` more units still fit after it;
+// returns the folding's length.
+std::size_t FoldRun(std::u16string_view run, std::u16string& out, std::size_t at,
+                    std::size_t rest) {
   std::u16string repaired;
   if (HasUnpairedSurrogate(run)) {
     ReplaceUnpairedSurrogates(run, repaired);
@@ -142,32 +146,37 @@ void AppendFoldedRun(std::u16string_view run, std::u16string& out) {
     folded = grown.data();
   }
   UErrorCode status = U_ZERO_ERROR;
-  const int32_t length =
-      u_strFoldCase(folded, static_cast<int32_t>(run.size() * 3), run.data(),
-                    static_cast<int32_t>(run.size()), U_FOLD_CASE_DEFAULT, &status);
-  if (U_FAILURE(status))
-    out.append(run); // cannot happen with a large enough buffer
-  else
-    out.append(folded, static_cast<std::size_t>(length));
+  int32_t length = u_strFoldCase(folded, static_cast<int32_t>(run.size() * 3), run.data(),
+                                 static_cast<int32_t>(run.size()), U_FOLD_CASE_DEFAULT, &status);
+  if (U_FAILURE(status)) { // cannot happen with a large enough buffer
+    folded = const_cast<char16_t*>(run.data());
+    length = static_cast<int32_t>(run.size());
+  }
+  const auto count = static_cast<std::size_t>(length);
+  if (at + count + rest > out.size())
+    out.resize(at + count + rest);
+  std::copy(folded, folded + count, out.begin() + static_cast<std::ptrdiff_t>(at));
+  return count;
 }
 
 } // namespace
 
 void FoldCaseUtf16(std::u16string_view text, std::u16string& out) {
-  out.clear();
-  out.reserve(text.size());
+  out.resize(text.size());
+  std::size_t length = 0;
   std::size_t i = 0;
   while (i < text.size()) {
     for (; i < text.size() && text[i] < 0x80; ++i)
-      out.push_back(static_cast<char16_t>(FoldAscii(text[i])));
+      out[length++] = static_cast<char16_t>(FoldAscii(text[i]));
     // Full folding maps each code point on its own, so the runs between
     // ASCII units fold apart; an ASCII unit never splits a surrogate pair.
     const std::size_t start = i;
     while (i < text.size() && text[i] >= 0x80)
       ++i;
     if (i > start)
-      AppendFoldedRun(text.substr(start, i - start), out);
+      length += FoldRun(text.substr(start, i - start), out, length, text.size() - i);
   }
+  out.resize(length);
 }
 
 int CompareCodePointOrder(std::u16string_view a, std::u16string_view b) noexcept {
