@@ -13,20 +13,23 @@
 #include <pugixml.hpp>
 
 #include <cstdio>
+#include <filesystem>
 #include <fstream>
 #include <sstream>
 #include <string>
 
 namespace {
 
+std::string Slurp(const std::string& path) {
+  std::ifstream in(path, std::ios::binary);
+  std::ostringstream out;
+  out << in.rdbuf();
+  return out.str();
+}
+
 const std::string& Template() {
-  static const std::string bytes = [] {
-    std::ifstream in(std::string(STYLES_WORD_CORPUS) + "/word-default-template.docx",
-                     std::ios::binary);
-    std::ostringstream out;
-    out << in.rdbuf();
-    return out.str();
-  }();
+  static const std::string bytes =
+      Slurp(std::string(STYLES_WORD_CORPUS) + "/word-default-template.docx");
   return bytes;
 }
 
@@ -96,5 +99,33 @@ void BM_WriteWordStylesPart(benchmark::State& state) {
   SetCounters(state, StylesPart().size());
 }
 BENCHMARK(BM_WriteWordStylesPart)->Unit(benchmark::kMillisecond);
+
+// Reading each file of the corpus, package and all; the styles read are a counter.
+const bool g_corpusRegistered = [] {
+  std::error_code error;
+  for (const auto& entry :
+       std::filesystem::directory_iterator(std::string(STYLES_WORD_CORPUS), error)) {
+    if (entry.path().extension() != ".docx" && entry.path().extension() != ".dotx")
+      continue;
+    const std::string path = entry.path().string();
+    benchmark::RegisterBenchmark(("BM_ReadWordFile/" + entry.path().filename().string()).c_str(),
+                                 [path](benchmark::State& state) {
+                                   RegisterWord();
+                                   const std::string bytes = Slurp(path);
+                                   double styles = 0;
+                                   for (auto _ : state) {
+                                     Styles::StyleSheet sheet;
+                                     Styles::Word::ReadReport report;
+                                     Styles::Word::ReadWord(bytes, sheet, report);
+                                     styles = 0;
+                                     for (const Styles::Style* style : sheet.GetStyles())
+                                       styles += Styles::Word::IsPartStyle(sheet, style) ? 0 : 1;
+                                   }
+                                   state.counters["styles"] = styles;
+                                 })
+        ->Unit(benchmark::kMillisecond);
+  }
+  return true;
+}();
 
 } // namespace

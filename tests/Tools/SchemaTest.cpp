@@ -1,4 +1,5 @@
 #include <StylesTools/Schema.h>
+#include <StylesTools/Provenance.h>
 
 #include "ToolsFixture.h"
 
@@ -69,6 +70,8 @@ TEST(SchemaTest, MalformedSchemasNameTheMemberAndRegisterNothing) {
        "/categories/0/properties/0/category"},
       {R"({"categories": [{"key": "a", "properties": [{"key": "x", "type": "array", "category": "a", "default": []}]}]})",
        "/categories/0/properties/0/default"},
+      {R"({"categories": [{"key": "a", "properties": [{"key": "x", "type": "substyle", "category": "a", "perStyle": true}]}]})",
+       "/categories/0/properties/0/perStyle"},
       {R"({"categories": [{"key": "a", "properties": [{"key": "x", "type": "bool", "minimumVersion": 1.5}]}]})",
        "/categories/0/properties/0/minimumVersion"},
       {R"({"categories": [{"key": "a", "properties": [{"key": "x", "type": "bool"}, {"key": "x", "type": "text"}]}]})",
@@ -184,7 +187,8 @@ TEST(SchemaTest, FlagsAndVersionsShapeWhatIsWritten) {
         {"key": "scratch", "type": "text", "temporary": true},
         {"key": "old", "type": "text", "deprecated": true},
         {"key": "recent", "type": "integer", "minimumVersion": 3},
-        {"key": "inner", "type": "substyle", "category": "note", "minimumVersion": 3}
+        {"key": "inner", "type": "substyle", "category": "note", "minimumVersion": 3},
+        {"key": "mark", "type": "text", "default": "-", "perStyle": true}
       ]}
     ]})"),
                           schema, error))
@@ -227,6 +231,22 @@ TEST(SchemaTest, FlagsAndVersionsShapeWhatIsWritten) {
     sheet.SetVersion(2);
     EXPECT_EQ(written(true), (Members{{"text", "\"t\""}, {"scratch", "\"s\""}}))
         << "properties newer than the sheet stay out, substyles included";
+
+    // A per-style value is the style's own or the default, never a parent's.
+    StyleSheet marks;
+    ASSERT_TRUE(marks.ImportFromString(
+        u"{\"note\": {\"P\": {\"mark\": \"p\", \"text\": \"t\"}, \"C\": {\"inherits\": \"P\"}}}",
+        true));
+    Style& child = *marks.GetStyle(u"C");
+    const PropertyKey mark(u"mark"), text(u"text");
+    EXPECT_EQ(ResolveProperty(child, mark).source, ValueSource::Default);
+    EXPECT_EQ(ResolveProperty(child, text).source, ValueSource::Ancestor);
+    std::unique_ptr<Style> flat(child.CreateFlattenedStyle());
+    EXPECT_FALSE(flat->DoesOverrideProperty(mark));
+    EXPECT_TRUE(flat->DoesOverrideProperty(text));
+    child.MergeParentProperties(marks.GetStyle(u"P"));
+    EXPECT_FALSE(child.DoesOverrideProperty(mark));
+    EXPECT_TRUE(child.DoesOverrideProperty(text));
   }
   DeregisterSchema(registration);
   EXPECT_FALSE(GetStyleManager().CategoryExists(u"style"));

@@ -154,6 +154,9 @@ TEST_F(WordFileTest, DefaultTemplateValuesFollowWordsRules) {
       {"Light Shading", "tableBorderTopWidth", Any(1.0)},
       {"Light Shading", "cellMarginLeft", Any(5.4)},
       {"Heading 1 Char", "bold", Any(true)},
+      // A style's own data is not taken from the style it is based on.
+      {"Normal", "isDefault", Any(true)},
+      {"Heading 1", "isDefault", Any(false)},
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(std::string(c.style) + " " + c.path);
@@ -178,6 +181,18 @@ TEST_F(WordFileTest, DefaultTemplateValuesFollowWordsRules) {
   EXPECT_EQ(heading.value.Get<double>(), 14.0);
   EXPECT_EQ(heading.source,
             sheet.GetStyle(u"Heading 1")->GetSubstyle(PropertyKey(u"character"), false));
+
+  // A table's first row sets bold over the whole table, within the table's level.
+  RunStyles cell;
+  cell.table = sheet.GetStyle(u"Light Shading");
+  EXPECT_FALSE(ResolveRunProperty(sheet, cell, bold).value.Get<bool>());
+  cell.formats = {PropertyKey(u"band1Horz"), PropertyKey(u"firstRow")};
+  const RunValue firstRow = ResolveRunProperty(sheet, cell, bold);
+  EXPECT_TRUE(firstRow.value.Get<bool>());
+  EXPECT_EQ(firstRow.source, cell.table->GetSubstyle(PropertyKey(u"firstRow"), false)
+                                 ->GetSubstyle(PropertyKey(u"character"), false));
+  cell.paragraph = sheet.GetStyle(u"Heading 1");
+  EXPECT_FALSE(ResolveRunProperty(sheet, cell, bold).value.Get<bool>());
 }
 
 TEST_F(WordFileTest, SheetFromJsonWritesWordsUnitsOrderAndIds) {

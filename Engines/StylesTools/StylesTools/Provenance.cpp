@@ -1,6 +1,7 @@
 #include <StylesTools/Provenance.h>
 
 #include <Internal/ToolsSupport.h>
+#include <StylesTools/Schema.h>
 
 #include <Styles/StyleCategory.h>
 #include <Styles/StyleManager.h>
@@ -28,6 +29,13 @@ Resolution DefaultOf(const StyleCategory* category, const PropertyKey& key, cons
     throw std::exception();
   return Resolution{&category->GetDefaultValue(key), ValueSource::Default, nullptr, category,
                     owner};
+}
+
+// Whether `key` of `category` belongs to each style alone, so that a style
+// without its own value has the default rather than a parent's.
+bool PerStyle(const StyleCategory* category, const PropertyKey& key) {
+  const BaseStyleProperty* behaviour = category ? category->GetStyleProperty(key) : nullptr;
+  return behaviour && IsPerStyle(*behaviour);
 }
 
 // The effective value of `key`, as Style::GetProperty gives it; through the
@@ -98,6 +106,8 @@ Resolution Inherit(const Style* current, const PropertyKey& key, ValueSource sou
 Resolution ResolveVirtual(const Style& anchor, const std::vector<PropertyKey>& virtualKeys,
                           const StyleCategory* category, const PropertyKey& key,
                           ResolutionCache* cache) {
+  if (PerStyle(category, key))
+    return DefaultOf(category, key, nullptr);
   std::vector<PropertyKey> keys(virtualKeys.rbegin(), virtualKeys.rend());
   const Style* climber = &anchor;
   const Style* ownerWithParent = anchor.GetParent() ? &anchor : nullptr;
@@ -173,6 +183,8 @@ void ListValues(const Style& anchor, std::vector<PropertyKey>& virtualKeys,
 Resolution ResolveProperty(const Style& style, const PropertyKey& key) {
   if (const ZelUtils::Any* own = style.GetProperties().Find(key))
     return Resolution{own, ValueSource::Own, &style, nullptr, nullptr};
+  if (PerStyle(style.GetCategory().get(), key))
+    return DefaultOf(style.GetCategory().get(), key, nullptr);
   return Inherit(&style, key, ValueSource::Ancestor, nullptr, nullptr);
 }
 
@@ -189,6 +201,8 @@ ResolutionCache::~ResolutionCache() = default;
 Resolution ResolutionCache::Resolve(const Style& style, const PropertyKey& key) {
   if (const ZelUtils::Any* own = style.GetProperties().Find(key))
     return Resolution{own, ValueSource::Own, &style, nullptr, nullptr};
+  if (PerStyle(style.GetCategory().get(), key))
+    return DefaultOf(style.GetCategory().get(), key, nullptr);
   std::vector<const Style*> pending{&style};
   Resolution result;
   for (;;) {

@@ -53,7 +53,9 @@ struct STYLES_TOOLS_API Resolution {
 /// Resolves `key` on `style` step by step as Style::GetProperty does, with the
 /// same result object and the same exceptions (std::bad_cast when an owner's
 /// parent holds no substyle where one must be, std::exception for a key that
-/// nobody holds and the category does not register).
+/// nobody holds and the category does not register). A property marked
+/// perStyle (PropertySchema) without an own value resolves to the default,
+/// as the style's flattened copy holds it.
 STYLES_TOOLS_API Resolution ResolveProperty(const Style& style, const PropertyKey& key);
 /// Resolves the end of `path` as Style::GetPathProperty does: through own
 /// substyles, and where the path leaves them, the default of the category

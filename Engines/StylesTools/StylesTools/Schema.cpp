@@ -153,6 +153,17 @@ public:
   bool CheckType(const Any& value) const override { return Accepts(m_property, value); }
   bool IsTemporary() const override { return m_property.temporary; }
   bool IsDeprecated() const override { return m_property.deprecated; }
+  bool IsPerStyle() const { return m_property.perStyle; }
+  // A per-style value is never taken from a parent, so neither merging nor
+  // flattening copies one down.
+  void MergeParentProperty(Style* target, const Style* parent,
+                           const PropertyKey& key) const override {
+    if (!m_property.perStyle)
+      StyleProperty::MergeParentProperty(target, parent, key);
+  }
+  bool FlattenProperty(Style* style, const PropertyKey& key) const override {
+    return !m_property.perStyle && StyleProperty::FlattenProperty(style, key);
+  }
 
 private:
   PropertySchema m_property;
@@ -315,7 +326,7 @@ struct SchemaReader {
     const Json::Object& object = AsObject(value, pointer);
     CheckMembers(object, pointer,
                  {u"key", u"type", u"default", u"minimum", u"maximum", u"values", u"category",
-                  u"minimumVersion", u"temporary", u"deprecated"});
+                  u"minimumVersion", u"temporary", u"deprecated", u"perStyle"});
     PropertySchema property;
     const Json::Value* key = object.Find(u"key");
     if (!key)
@@ -381,6 +392,11 @@ struct SchemaReader {
       property.temporary = AsBool(*flag, AppendPointer(pointer, u"temporary"));
     if (const Json::Value* flag = object.Find(u"deprecated"))
       property.deprecated = AsBool(*flag, AppendPointer(pointer, u"deprecated"));
+    if (const Json::Value* flag = object.Find(u"perStyle")) {
+      property.perStyle = AsBool(*flag, AppendPointer(pointer, u"perStyle"));
+      if (holdsStyles && property.perStyle)
+        Fail(AppendPointer(pointer, u"perStyle"), u"applies to plain properties only");
+    }
     return property;
   }
 
@@ -497,6 +513,11 @@ BaseStyleProperty* CreateBehaviour(const PropertySchema& property) {
   default:
     return new SchemaProperty(property);
   }
+}
+
+bool IsPerStyle(const BaseStyleProperty& behaviour) {
+  const auto* stock = dynamic_cast<const SchemaProperty*>(&behaviour);
+  return stock && stock->IsPerStyle();
 }
 
 bool RegisterSchema(const Schema& schema, SchemaRegistration& registration, SchemaError& error) {

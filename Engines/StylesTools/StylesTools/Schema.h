@@ -52,6 +52,11 @@ struct STYLES_TOOLS_API PropertySchema {
   bool temporary = false;
   /// Read after the current properties (BaseStyleProperty::IsDeprecated).
   bool deprecated = false;
+  /// A plain property that belongs to each style alone: merging a parent's
+  /// values and flattening leave it out, and the toolkit's resolution
+  /// (ResolveProperty, ListEffectiveValues) gives the style's own value or the
+  /// default. Style::GetProperty itself still climbs the parents.
+  bool perStyle = false;
 };
 
 /// One category of a schema.
@@ -105,6 +110,8 @@ STYLES_TOOLS_API Schema DefaultSchema();
 /// allowed texts and colour form in CheckType; their conversion policies refuse
 /// text that is not a number, an integer, a flag, a colour or an allowed text.
 STYLES_TOOLS_API BaseStyleProperty* CreateBehaviour(const PropertySchema& property);
+/// Whether `behaviour` is a stock behaviour of a property marked perStyle.
+STYLES_TOOLS_API bool IsPerStyle(const BaseStyleProperty& behaviour);
 
 /// What RegisterSchema added to the manager, so that it can be taken out again.
 struct STYLES_TOOLS_API SchemaRegistration {

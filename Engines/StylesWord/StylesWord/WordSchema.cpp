@@ -57,13 +57,19 @@ PropertySchema FromField(const detail::Field& field) {
 
 // The fields of `containers`, then the raw keys of each.
 void AddContainers(Tools::CategorySchema& category, std::initializer_list<Container> containers) {
+  // A style's own data (default flag, next, link, priority, ...) is never
+  // taken from the style it is based on.
+  const auto add = [&](Container container, PropertySchema property) {
+    property.perStyle = container == Container::Style;
+    category.properties.push_back(std::move(property));
+  };
   for (Container container : containers)
     for (const detail::Group& group : detail::Groups())
       if (group.container == container)
         for (const detail::Field* field : group.fields)
-          category.properties.push_back(FromField(*field));
+          add(container, FromField(*field));
   for (Container container : containers)
-    category.properties.push_back(Plain(detail::RawKey(container), ValueType::Text, Any(Text())));
+    add(container, Plain(detail::RawKey(container), ValueType::Text, Any(Text())));
 }
 
 } // namespace
@@ -135,22 +141,43 @@ RunValue ResolveRunProperty(const StyleSheet& sheet, const RunStyles& styles,
     result.value = *base.value;
     result.source = base.holder;
   }
+  const auto substyle = [](const Style* style, const PropertyKey& property) -> const Style* {
+    if (!style)
+      return nullptr;
+    const Any& value = *Tools::ResolveProperty(*style, property).value;
+    const Style* const* held = value.GetIf<Style*>();
+    return held ? *held : nullptr;
+  };
   const auto levelStyle = [&](const Style* style) -> const Style* {
     if (!style || style->GetCategoryName() == characterKey)
       return style;
-    const Any& substyle = Tools::ResolveProperty(*style, characterKey).value[0];
-    const Style* const* held = substyle.GetIf<Style*>();
-    return held ? *held : nullptr;
+    return substyle(style, characterKey);
   };
-  const bool toggle = IsToggleProperty(key);
-  for (const Style* level :
-       {levelStyle(styles.table), levelStyle(styles.paragraph), levelStyle(styles.character)}) {
+  // What one level sets: the nearest own value along its chain, where the
+  // chain is not the defaults' own.
+  const auto levelValue = [&](const Style* level) -> Tools::Resolution {
+    Tools::Resolution found;
     if (!level)
-      continue;
-    const Tools::Resolution found = Tools::ResolveProperty(*level, key);
+      return found;
+    found = Tools::ResolveProperty(*level, key);
     if (result.value.IsEmpty() && !found.holder)
       result.value = *found.value; // the category default, when no defaults style exists
-    if (!found.holder || IsPartStyle(sheet, found.holder))
+    if (IsPartStyle(sheet, found.holder))
+      found.holder = nullptr;
+    return found;
+  };
+
+  Tools::Resolution table = levelValue(levelStyle(styles.table));
+  // The cell's conditional formats set what they set over the whole table.
+  for (const PropertyKey& format : styles.formats) {
+    const Tools::Resolution conditional = levelValue(levelStyle(substyle(styles.table, format)));
+    if (conditional.holder)
+      table = conditional;
+  }
+  const bool toggle = IsToggleProperty(key);
+  for (const Tools::Resolution& found : {table, levelValue(levelStyle(styles.paragraph)),
+                                         levelValue(levelStyle(styles.character))}) {
+    if (!found.holder)
       continue;
     if (!toggle) {
       result.value = *found.value;

@@ -14,6 +14,8 @@
 #include <ZelPlatform/ZelString.h>
 #include <ZelUtils/Any.h>
 
+#include <vector>
+
 namespace Styles {
 
 class StyleSheet;
@@ -46,6 +48,12 @@ STYLES_WORD_API bool IsToggleProperty(const PropertyKey& key);
 struct STYLES_WORD_API RunStyles {
   /// A style of category "table"; its "character" substyle is the table's level.
   const Style* table = nullptr;
+  /// The conditional formats of `table` that apply to the run's cell, such as
+  /// "firstRow" or "band1Horz", in the order Word layers them (wholeTable,
+  /// banded columns, banded rows, first and last column, first and last row,
+  /// corner cells): what each one's "character" substyle sets replaces the
+  /// table's value, within the table's level.
+  std::vector<PropertyKey> formats;
   /// A style of category "paragraph"; its "character" substyle is its level.
   const Style* paragraph = nullptr;
   /// A style of category "character".
@@ -64,7 +72,7 @@ struct STYLES_WORD_API RunValue {
 /// The effective value of the character property `key` for a run formatted by
 /// `styles` of `sheet`. Within one level (table, paragraph, character) the
 /// nearest style along the parent chain that sets the key wins, as for any
-/// property. Across levels a plain property takes the last level's value; a
+/// property, and the table's conditional formats override the whole table. Across levels a plain property takes the last level's value; a
 /// toggle property starts from the document defaults and is flipped by every
 /// level whose value is true. Throws what Style::GetProperty throws.
 STYLES_WORD_API RunValue ResolveRunProperty(const StyleSheet& sheet, const RunStyles& styles,
