@@ -392,11 +392,30 @@ public:
   // from a text it does not change, so the number is read from the text,
   // where the stream still points at its first unit; the reader checked it.
   bool RawNumber(const Ch*, SizeType, bool) {
+    // The number's extent by the JSON grammar, as the reader took it: a sign,
+    // digits, a fraction, an exponent; what follows is the reader's to judge.
     const std::size_t start = m_stream.Tell();
     std::size_t end = start;
-    while (end < m_source.size() &&
-           std::u16string_view(u"0123456789+-.eE").find(m_source[end]) != std::u16string_view::npos)
+    const auto digits = [&] {
+      while (end < m_source.size() && m_source[end] >= u'0' && m_source[end] <= u'9')
+        ++end;
+    };
+    if (end < m_source.size() && m_source[end] == u'-')
       ++end;
+    if (end < m_source.size() && m_source[end] == u'0')
+      ++end; // a leading zero stands alone
+    else
+      digits();
+    if (end < m_source.size() && m_source[end] == u'.') {
+      ++end;
+      digits();
+    }
+    if (end < m_source.size() && (m_source[end] == u'e' || m_source[end] == u'E')) {
+      ++end;
+      if (end < m_source.size() && (m_source[end] == u'+' || m_source[end] == u'-'))
+        ++end;
+      digits();
+    }
     return NumberEvents<DocumentBuilder>::RawNumber(m_source.data() + start,
                                                     static_cast<SizeType>(end - start), false);
   }
