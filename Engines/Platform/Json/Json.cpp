@@ -23,11 +23,14 @@ thread_local unsigned g_failedChecks = 0;
 #include <charconv>
 #include <cmath>
 #include <cstdint>
+#include <cstdlib>
+#include <cstring>
 #include <limits>
 #include <string>
 #include <string_view>
 #include <system_error>
 #include <type_traits>
+#include <vector>
 
 namespace Json {
 namespace {
@@ -318,6 +321,41 @@ private:
 
 namespace {
 
+// The reader's stack allocator where it reads a text without changing it.
+// There the reader copies a number into UTF-16 by reading it from its stack
+// while writing to the same stack, and a write that grew the stack freed the
+// block still being read; grown-out blocks are therefore kept until the
+// reader goes. Nothing reads that copy: the document reads numbers from the
+// text.
+class KeepingAllocator {
+public:
+  static const bool kNeedFree = true;
+  KeepingAllocator() = default;
+  KeepingAllocator(const KeepingAllocator&) = delete;
+  KeepingAllocator& operator=(const KeepingAllocator&) = delete;
+  ~KeepingAllocator() {
+    for (void* block : m_retired)
+      std::free(block);
+  }
+  void* Malloc(std::size_t size) { return size ? std::malloc(size) : nullptr; }
+  void* Realloc(void* original, std::size_t originalSize, std::size_t newSize) {
+    m_retired.push_back(nullptr); // room first, so that nothing below throws
+    void* block = newSize ? std::malloc(newSize) : nullptr;
+    if (newSize && !block) {
+      m_retired.pop_back();
+      return nullptr;
+    }
+    if (original && block)
+      std::memcpy(block, original, std::min(originalSize, newSize));
+    m_retired.back() = original;
+    return block;
+  }
+  static void Free(void* block) { std::free(block); }
+
+private:
+  std::vector<void*> m_retired;
+};
+
 // Runs the reader over `stream`, the text without a leading byte order mark
 // (`skipped` units shorter, `length` units long), with `handler`; false, with
 // `errorText` set, when the text is not exactly one valid JSON value.
@@ -328,12 +366,14 @@ bool RunReader(Stream& stream, std::size_t length, std::size_t skipped, Handler&
   // converts them, since the reader's own conversion misrounds some (10e308
   // gives a tiny negative number, 2e-324 is not rounded to zero) and can
   // overflow its exponent arithmetic.
-  rapidjson::GenericReader<Utf16, Utf16> reader;
+  using StackAllocator = std::conditional_t<(kExtraFlags & rapidjson::kParseInsituFlag) != 0,
+                                            rapidjson::CrtAllocator, KeepingAllocator>;
+  rapidjson::GenericReader<Utf16, Utf16, StackAllocator> reader;
   constexpr unsigned kFlags = rapidjson::kParseIterativeFlag |
                               rapidjson::kParseValidateEncodingFlag |
                               rapidjson::kParseNumbersAsStringsFlag | kExtraFlags;
   const unsigned failedChecks = g_failedChecks;
-  const rapidjson::ParseResult result = reader.Parse<kFlags>(stream, handler);
+  const rapidjson::ParseResult result = reader.template Parse<kFlags>(stream, handler);
 
   const char* message = nullptr;
   std::size_t offset = 0;
