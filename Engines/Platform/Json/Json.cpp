@@ -329,7 +329,6 @@ namespace {
 // text.
 class KeepingAllocator {
 public:
-  static const bool kNeedFree = true;
   KeepingAllocator() = default;
   KeepingAllocator(const KeepingAllocator&) = delete;
   KeepingAllocator& operator=(const KeepingAllocator&) = delete;
