@@ -23,11 +23,14 @@ thread_local unsigned g_failedChecks = 0;
 #include <charconv>
 #include <cmath>
 #include <cstdint>
+#include <cstdlib>
+#include <cstring>
 #include <limits>
 #include <string>
 #include <string_view>
 #include <system_error>
 #include <type_traits>
+#include <vector>
 
 namespace Json {
 namespace {
@@ -318,23 +321,58 @@ private:
 
 namespace {
 
-// Runs the reader over `buffer` (the text without a leading byte order mark,
-// `skipped` units shorter) with `handler`; false, with `errorText` set, when
-// the text is not exactly one valid JSON value.
-template <class Handler>
-bool RunReader(std::u16string& buffer, std::size_t skipped, Handler& handler,
+// The reader's stack allocator where it reads a text without changing it.
+// There the reader copies a number into UTF-16 by reading it from its stack
+// while writing to the same stack, and a write that grew the stack freed the
+// block still being read; grown-out blocks are therefore kept until the
+// reader goes. Nothing reads that copy: the document reads numbers from the
+// text.
+class KeepingAllocator {
+public:
+  KeepingAllocator() = default;
+  KeepingAllocator(const KeepingAllocator&) = delete;
+  KeepingAllocator& operator=(const KeepingAllocator&) = delete;
+  ~KeepingAllocator() {
+    for (void* block : m_retired)
+      std::free(block);
+  }
+  void* Malloc(std::size_t size) { return size ? std::malloc(size) : nullptr; }
+  void* Realloc(void* original, std::size_t originalSize, std::size_t newSize) {
+    m_retired.push_back(nullptr); // room first, so that nothing below throws
+    void* block = newSize ? std::malloc(newSize) : nullptr;
+    if (newSize && !block) {
+      m_retired.pop_back();
+      return nullptr;
+    }
+    if (original && block)
+      std::memcpy(block, original, std::min(originalSize, newSize));
+    m_retired.back() = original;
+    return block;
+  }
+  static void Free(void* block) { std::free(block); }
+
+private:
+  std::vector<void*> m_retired;
+};
+
+// Runs the reader over `stream`, the text without a leading byte order mark
+// (`skipped` units shorter, `length` units long), with `handler`; false, with
+// `errorText` set, when the text is not exactly one valid JSON value.
+template <unsigned kExtraFlags, class Stream, class Handler>
+bool RunReader(Stream& stream, std::size_t length, std::size_t skipped, Handler& handler,
                ZelStringT<char16_t>& errorText) {
-  // The reader decodes strings in place and hands numbers over as their
-  // text, untouched: the handler converts them, since the reader's own
-  // conversion misrounds some (10e308 gives a tiny negative number, 2e-324 is
-  // not rounded to zero) and can overflow its exponent arithmetic.
-  rapidjson::GenericInsituStringStream<Utf16> stream(buffer.data());
-  rapidjson::GenericReader<Utf16, Utf16> reader;
-  constexpr unsigned kFlags = rapidjson::kParseIterativeFlag | rapidjson::kParseInsituFlag |
+  // The reader hands numbers over as their text, untouched: the handler
+  // converts them, since the reader's own conversion misrounds some (10e308
+  // gives a tiny negative number, 2e-324 is not rounded to zero) and can
+  // overflow its exponent arithmetic.
+  using StackAllocator = std::conditional_t<(kExtraFlags & rapidjson::kParseInsituFlag) != 0,
+                                            rapidjson::CrtAllocator, KeepingAllocator>;
+  rapidjson::GenericReader<Utf16, Utf16, StackAllocator> reader;
+  constexpr unsigned kFlags = rapidjson::kParseIterativeFlag |
                               rapidjson::kParseValidateEncodingFlag |
-                              rapidjson::kParseNumbersAsStringsFlag;
+                              rapidjson::kParseNumbersAsStringsFlag | kExtraFlags;
   const unsigned failedChecks = g_failedChecks;
-  const rapidjson::ParseResult result = reader.Parse<kFlags>(stream, handler);
+  const rapidjson::ParseResult result = reader.template Parse<kFlags>(stream, handler);
 
   const char* message = nullptr;
   std::size_t offset = 0;
@@ -346,7 +384,7 @@ bool RunReader(std::u16string& buffer, std::size_t skipped, Handler& handler,
   } else if (g_failedChecks != failedChecks) {
     message = "Invalid text";
     offset = stream.Tell() + skipped;
-  } else if (stream.Tell() != buffer.size()) {
+  } else if (stream.Tell() != length) {
     // A NUL inside the text ends the stream early; what follows it is not JSON.
     message = "Unexpected NUL character";
     offset = stream.Tell() + skipped;
@@ -368,47 +406,91 @@ std::size_t ByteOrderMarkLength(const ZelStringT<char16_t>& text) {
 
 // SAX handler that builds a Document's nodes. The children of open
 // containers wait on a stack; when a container closes they move, in order,
-// to the end of the final array and the container records where they start.
+// to the end of the final arrays and the container records where they start.
+// A string whose decoded text equals the text between its quotes (it has no
+// escape) is kept as an offset into the text, which the reader's stream,
+// while a string is read, still shows at its opening quote.
 class DocumentBuilder : public NumberEvents<DocumentBuilder> {
   friend class NumberEvents<DocumentBuilder>;
 
 public:
   using Node = detail::DocumentNode;
+  using Stream = rapidjson::GenericStringStream<Utf16>;
 
-  explicit DocumentBuilder(std::vector<Node>& nodes) : m_nodes(nodes) {}
+  DocumentBuilder(const Stream& stream, std::u16string_view source, std::u16string& copies,
+                  std::vector<double>& numbers, std::vector<Node>& nodes,
+                  std::vector<std::uint8_t>& kinds)
+      : m_stream(stream), m_source(source), m_copies(copies), m_numbers(numbers), m_nodes(nodes),
+        m_kinds(kinds) {}
 
-  bool Null() { return Push(Node{Node::kNull, 0, {}}); }
-  bool Bool(bool flag) {
-    Node node{Node::kBool, 0, {}};
-    node.flag = flag;
-    return Push(node);
+  bool Null() { return Push(Node::kNull, Node{0, 0}); }
+  bool Bool(bool flag) { return Push(Node::kBool, Node{0, flag}); }
+  bool String(const Ch* text, SizeType length, bool) { return Text(Node::kString, text, length); }
+  bool Key(const Ch* text, SizeType length, bool) { return Text(Node::kName, text, length); }
+  // The reader's own copy of a number is garbled when it parses into UTF-16
+  // from a text it does not change, so the number is read from the text,
+  // where the stream still points at its first unit; the reader checked it.
+  bool RawNumber(const Ch*, SizeType, bool) {
+    // The number's extent by the JSON grammar, as the reader took it: a sign,
+    // digits, a fraction, an exponent; what follows is the reader's to judge.
+    const std::size_t start = m_stream.Tell();
+    std::size_t end = start;
+    const auto digits = [&] {
+      while (end < m_source.size() && m_source[end] >= u'0' && m_source[end] <= u'9')
+        ++end;
+    };
+    if (end < m_source.size() && m_source[end] == u'-')
+      ++end;
+    if (end < m_source.size() && m_source[end] == u'0')
+      ++end; // a leading zero stands alone
+    else
+      digits();
+    if (end < m_source.size() && m_source[end] == u'.') {
+      ++end;
+      digits();
+    }
+    if (end < m_source.size() && (m_source[end] == u'e' || m_source[end] == u'E')) {
+      ++end;
+      if (end < m_source.size() && (m_source[end] == u'+' || m_source[end] == u'-'))
+        ++end;
+      digits();
+    }
+    return NumberEvents<DocumentBuilder>::RawNumber(m_source.data() + start,
+                                                    static_cast<SizeType>(end - start), false);
   }
-  bool String(const Ch* text, SizeType length, bool) {
-    return Push(Text(Node::kString, text, length));
-  }
-  bool Key(const Ch* text, SizeType length, bool) { return Push(Text(Node::kName, text, length)); }
   bool StartObject() { return Enter(); }
   bool StartArray() { return Enter(); }
   bool EndObject(SizeType memberCount) { return Leave(Node::kObject, memberCount, 2); }
   bool EndArray(SizeType elementCount) { return Leave(Node::kArray, elementCount, 1); }
 
-  // Moves the root to the end of the final array; once the reader succeeded.
-  void Finish() { m_nodes.push_back(m_open.back()); }
+  // Moves the root to the end of the final arrays; once the reader succeeded.
+  void Finish() {
+    m_nodes.push_back(m_openNodes.back());
+    m_kinds.push_back(m_openKinds.back());
+  }
   const char* GetError() const { return m_error; }
 
 private:
-  static Node Text(Node::Kind kind, const Ch* text, SizeType length) {
-    Node node{kind, length, {}};
-    node.text = text;
-    return node;
+  bool Text(std::uint8_t kind, const Ch* text, SizeType length) {
+    const std::size_t quote = m_stream.Tell();
+    if (quote < m_source.size() && m_source[quote] == u'"' &&
+        m_source.substr(quote + 1, length) == std::u16string_view(text, length))
+      return Push(kind, Node{length, static_cast<std::uint32_t>(quote + 1)});
+    if (m_copies.size() + length > std::numeric_limits<std::uint32_t>::max())
+      return Fail("Document too large");
+    const Node node{length, static_cast<std::uint32_t>(m_copies.size())};
+    m_copies.append(text, length);
+    return Push(kind | Node::kCopied, node);
   }
   bool Number(double number) {
-    Node node{Node::kNumber, 0, {}};
-    node.number = number;
-    return Push(node);
+    if (m_numbers.size() >= std::numeric_limits<std::uint32_t>::max())
+      return Fail("Document too large");
+    m_numbers.push_back(number);
+    return Push(Node::kNumber, Node{0, static_cast<std::uint32_t>(m_numbers.size() - 1)});
   }
-  bool Push(const Node& node) {
-    m_open.push_back(node);
+  bool Push(std::uint8_t kind, const Node& node) {
+    m_openNodes.push_back(node);
+    m_openKinds.push_back(kind);
     return true;
   }
   bool Enter() {
@@ -420,23 +502,29 @@ private:
   bool Leave(Node::Kind kind, SizeType count, std::size_t nodesPerChild) {
     --m_depth;
     const std::size_t children = count * nodesPerChild;
-    Node node{kind, count, {}};
-    node.first = static_cast<std::uint32_t>(m_nodes.size());
     if (m_nodes.size() + children > std::numeric_limits<std::uint32_t>::max())
       return Fail("Document too large");
-    m_nodes.insert(m_nodes.end(), m_open.end() - static_cast<std::ptrdiff_t>(children),
-                   m_open.end());
-    m_open.resize(m_open.size() - children);
-    m_open.push_back(node);
-    return true;
+    const Node node{count, static_cast<std::uint32_t>(m_nodes.size())};
+    const auto from = static_cast<std::ptrdiff_t>(m_openNodes.size() - children);
+    m_nodes.insert(m_nodes.end(), m_openNodes.begin() + from, m_openNodes.end());
+    m_kinds.insert(m_kinds.end(), m_openKinds.begin() + from, m_openKinds.end());
+    m_openNodes.resize(m_openNodes.size() - children);
+    m_openKinds.resize(m_openKinds.size() - children);
+    return Push(kind, node);
   }
   bool Fail(const char* message) {
     m_error = message;
     return false;
   }
 
+  const Stream& m_stream;
+  std::u16string_view m_source;
+  std::u16string& m_copies;
+  std::vector<double>& m_numbers;
   std::vector<Node>& m_nodes;
-  std::vector<Node> m_open;
+  std::vector<std::uint8_t>& m_kinds;
+  std::vector<Node> m_openNodes; // the children of open containers, and their kinds
+  std::vector<std::uint8_t> m_openKinds;
   int m_depth = 1;
   const char* m_error = nullptr;
 };
@@ -447,53 +535,86 @@ bool Parse(const ZelStringT<char16_t>& text, Value& out, ZelStringT<char16_t>& e
   const std::size_t skipped = ByteOrderMarkLength(text);
   std::u16string buffer(text.GetView().substr(skipped));
   TreeBuilder builder;
-  if (!RunReader(buffer, skipped, builder, errorText))
+  // The reader decodes strings in place, in this copy of the text.
+  rapidjson::GenericInsituStringStream<Utf16> stream(buffer.data());
+  if (!RunReader<rapidjson::kParseInsituFlag>(stream, buffer.size(), skipped, builder, errorText))
     return false;
   out = std::move(builder.GetRoot());
   return true;
 }
 
-Document::Document() : m_nodes(1, detail::DocumentNode{detail::DocumentNode::kNull, 0, {}}) {}
+Document::Document() { Reset(); }
 
 Document::~Document() = default;
 
+void Document::Reset() {
+  m_owned.clear();
+  m_source = nullptr;
+  m_copies.clear();
+  m_numbers.clear();
+  m_nodes.assign(1, detail::DocumentNode{0, 0});
+  m_kinds.assign(1, detail::DocumentNode::kNull);
+}
+
 bool Document::Parse(const ZelStringT<char16_t>& text, ZelStringT<char16_t>& errorText) {
-  const std::size_t skipped = ByteOrderMarkLength(text);
-  m_buffer.assign(text.GetView().substr(skipped));
+  Reset();
+  m_owned = text.GetStdString();
+  return Read(m_owned, errorText);
+}
+
+bool Document::ParseBorrowed(const ZelStringT<char16_t>& text, ZelStringT<char16_t>& errorText) {
+  Reset();
+  return Read(text.GetView(), errorText);
+}
+
+bool Document::Read(std::u16string_view text, ZelStringT<char16_t>& errorText) {
+  const std::size_t skipped = !text.empty() && text[0] == kByteOrderMark ? 1 : 0;
+  const std::u16string_view source = text.substr(skipped);
+  if (source.size() > std::numeric_limits<std::uint32_t>::max()) {
+    errorText = u"Document too large at offset 0";
+    Reset();
+    return false;
+  }
   m_nodes.clear();
+  m_kinds.clear();
   // Documents of styles spend about ten units of text on a node; one guess
-  // saves most of the array's growth steps.
-  m_nodes.reserve(m_buffer.size() / 8 + 16);
-  DocumentBuilder builder(m_nodes);
-  if (!RunReader(m_buffer, skipped, builder, errorText)) {
-    m_buffer.clear();
-    m_nodes.assign(1, detail::DocumentNode{detail::DocumentNode::kNull, 0, {}});
+  // saves most of the arrays' growth steps.
+  m_nodes.reserve(source.size() / 8 + 16);
+  m_kinds.reserve(source.size() / 8 + 16);
+  // The text is NUL-terminated, as the stream needs.
+  rapidjson::GenericStringStream<Utf16> stream(source.data());
+  DocumentBuilder builder(stream, source, m_copies, m_numbers, m_nodes, m_kinds);
+  if (!RunReader<0>(stream, source.size(), skipped, builder, errorText)) {
+    Reset();
     return false;
   }
   builder.Finish();
+  m_source = source.data();
   return true;
 }
 
 Value Document::Ref::ToValue() const {
-  switch (m_node->kind) {
+  using Node = detail::DocumentNode;
+  const std::size_t size = m_document->m_nodes[m_index].size;
+  switch (Kind()) {
   case Node::kString:
-    return Value(ZelStringT<char16_t>(m_node->text, m_node->size));
+    return Value(ZelStringT<char16_t>(GetString()));
   case Node::kNumber:
-    return Value(m_node->number);
+    return Value(GetNumber());
   case Node::kBool:
-    return Value(m_node->flag);
+    return Value(GetBool());
   case Node::kObject: {
     // Nesting is bounded by kMaxDepth, and so is this recursion.
     std::vector<Member> members;
-    members.reserve(m_node->size);
-    for (std::size_t i = 0; i < m_node->size; ++i)
+    members.reserve(size);
+    for (std::size_t i = 0; i < size; ++i)
       members.push_back(Member{ZelStringT<char16_t>(GetMemberName(i)), GetMember(i).ToValue()});
     return Value(Object(std::move(members)));
   }
   case Node::kArray: {
     std::vector<Value> elements;
-    elements.reserve(m_node->size);
-    for (std::size_t i = 0; i < m_node->size; ++i)
+    elements.reserve(size);
+    for (std::size_t i = 0; i < size; ++i)
       elements.push_back(GetElement(i).ToValue());
     return Value(Array(std::move(elements)));
   }
@@ -505,7 +626,8 @@ Value Document::Ref::ToValue() const {
 void Document::Ref::AssignTo(Value& out) const {
   if (IsString()) {
     if (ZelStringT<char16_t>* text = out.GetIf<ZelStringT<char16_t>>()) {
-      text->GetStdString().assign(m_node->text, m_node->size);
+      const std::u16string_view string = GetString();
+      text->GetStdString().assign(string.data(), string.size());
       return;
     }
   }

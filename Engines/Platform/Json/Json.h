@@ -234,67 +234,70 @@ ZEL_API bool Parse(const ZelStringT<char16_t>& text, Value& out, ZelStringT<char
 ZEL_API ZelStringT<char16_t> ValueToString(const Value& value, bool format);
 
 namespace detail {
-// One value of a Document, or the name of an object member.
+// One value of a Document, or the name of an object member. Its kind is kept
+// apart, one byte a node, so that a node is two words of 32 bits.
 struct DocumentNode {
   enum Kind : std::uint8_t { kNull, kString, kNumber, kBool, kObject, kArray, kName };
-  Kind kind;
+  // Set on the kind of a string or name whose decoded text differs from the
+  // text it was read from (it had escapes) and so is kept in a side buffer.
+  static constexpr std::uint8_t kCopied = 0x80;
   std::uint32_t size; // a string's or name's length; an object's members, an array's elements
-  union {
-    double number;
-    bool flag;
-    const char16_t* text;
-    std::uint32_t first; // a container's first child: members come as name, value pairs
-  };
+  // A string's or name's offset into its text, a number's index, a bool's
+  // flag, or a container's first child: members come as name, value pairs.
+  std::uint32_t payload;
 };
 } // namespace detail
 
 /// A JSON text parsed once into a compact, read-only form: the values sit in
-/// one array and the strings point into the document's own copy of the text,
-/// so reading even a large text takes a handful of allocations instead of
-/// several per value. Parse accepts and rejects exactly what Json::Parse
-/// does, with the same messages; ToValue turns any part into an ordinary Value.
+/// one array of two-word nodes and the strings point into the text itself
+/// (those with escapes into one side buffer), so reading even a large text
+/// takes a handful of allocations instead of several per value. Parse accepts
+/// and rejects exactly what Json::Parse does, with the same messages; ToValue
+/// turns any part into an ordinary Value.
 class ZEL_API Document {
+  using Node = detail::DocumentNode;
+
 public:
-  /// A value inside a document; valid while the document lives unchanged.
+  /// A value inside a document; valid while the document lives unchanged
+  /// (and, after ParseBorrowed, while its text does).
   class Ref {
   public:
     ///@{
 
     /// The kind of the value.
-    bool IsNull() const noexcept { return m_node->kind == Node::kNull; }
-    bool IsString() const noexcept { return m_node->kind == Node::kString; }
-    bool IsNumber() const noexcept { return m_node->kind == Node::kNumber; }
-    bool IsBool() const noexcept { return m_node->kind == Node::kBool; }
-    bool IsObject() const noexcept { return m_node->kind == Node::kObject; }
-    bool IsArray() const noexcept { return m_node->kind == Node::kArray; }
+    bool IsNull() const noexcept { return Kind() == Node::kNull; }
+    bool IsString() const noexcept { return Kind() == Node::kString; }
+    bool IsNumber() const noexcept { return Kind() == Node::kNumber; }
+    bool IsBool() const noexcept { return Kind() == Node::kBool; }
+    bool IsObject() const noexcept { return Kind() == Node::kObject; }
+    bool IsArray() const noexcept { return Kind() == Node::kArray; }
     ///@}
 
     /// The text of a string; empty for other kinds.
     std::u16string_view GetString() const noexcept {
-      return IsString() ? std::u16string_view(m_node->text, m_node->size) : std::u16string_view();
+      return IsString() ? m_document->TextOf(m_index) : std::u16string_view();
     }
     /// The number; 0 for other kinds.
-    double GetNumber() const noexcept { return IsNumber() ? m_node->number : 0.0; }
+    double GetNumber() const noexcept {
+      return IsNumber() ? m_document->m_numbers[m_document->m_nodes[m_index].payload] : 0.0;
+    }
     /// The flag; false for other kinds.
-    bool GetBool() const noexcept { return IsBool() && m_node->flag; }
+    bool GetBool() const noexcept { return IsBool() && m_document->m_nodes[m_index].payload; }
     /// The number of members of an object or elements of an array; else 0.
-    std::size_t GetSize() const noexcept { return IsObject() || IsArray() ? m_node->size : 0; }
+    std::size_t GetSize() const noexcept {
+      return IsObject() || IsArray() ? m_document->m_nodes[m_index].size : 0;
+    }
     ///@{
 
     /// Member i of an object (i below GetSize()).
     std::u16string_view GetMemberName(std::size_t i) const noexcept {
-      const Node& name = m_nodes[m_node->first + 2 * i];
-      return std::u16string_view(name.text, name.size);
+      return m_document->TextOf(First() + 2 * i);
     }
-    Ref GetMember(std::size_t i) const noexcept {
-      return Ref(m_nodes, &m_nodes[m_node->first + 2 * i + 1]);
-    }
+    Ref GetMember(std::size_t i) const noexcept { return Ref(m_document, First() + 2 * i + 1); }
     ///@}
 
     /// Element i of an array (i below GetSize()).
-    Ref GetElement(std::size_t i) const noexcept {
-      return Ref(m_nodes, &m_nodes[m_node->first + i]);
-    }
+    Ref GetElement(std::size_t i) const noexcept { return Ref(m_document, First() + i); }
     /// An owning copy of this value and everything in it.
     ZEL_API Value ToValue() const;
     /// Makes `out` this value, reusing the storage of a string it holds.
@@ -302,11 +305,13 @@ public:
 
   private:
     friend class Document;
-    using Node = detail::DocumentNode;
-    Ref(const Node* nodes, const Node* node) noexcept : m_nodes(nodes), m_node(node) {}
+    Ref(const Document* document, std::size_t index) noexcept
+        : m_document(document), m_index(index) {}
+    std::uint8_t Kind() const noexcept { return m_document->m_kinds[m_index] & ~Node::kCopied; }
+    std::size_t First() const noexcept { return m_document->m_nodes[m_index].payload; }
 
-    const Node* m_nodes;
-    const Node* m_node;
+    const Document* m_document;
+    std::size_t m_index;
   };
 
   Document();
@@ -314,15 +319,32 @@ public:
   Document(const Document&) = delete;
   Document& operator=(const Document&) = delete;
 
-  /// Parses the whole of `text`; on failure the document is empty (its root
-  /// is null) and `errorText` says why, as Json::Parse would.
+  /// Parses the whole of `text`, which the document copies; on failure the
+  /// document is empty (its root is null) and `errorText` says why, as
+  /// Json::Parse would.
   bool Parse(const ZelStringT<char16_t>& text, ZelStringT<char16_t>& errorText);
+  /// The same without a copy: the document reads its strings from `text`,
+  /// which must outlive the document and stay unchanged.
+  bool ParseBorrowed(const ZelStringT<char16_t>& text, ZelStringT<char16_t>& errorText);
   /// The parsed value; null before a successful Parse.
-  Ref GetRoot() const noexcept { return Ref(m_nodes.data(), &m_nodes.back()); }
+  Ref GetRoot() const noexcept { return Ref(this, m_nodes.size() - 1); }
 
 private:
-  std::u16string m_buffer;                   // the text, strings decoded in place
-  std::vector<detail::DocumentNode> m_nodes; // children before parents; the root last
+  std::u16string_view TextOf(std::size_t index) const noexcept {
+    const Node& node = m_nodes[index];
+    const char16_t* base = m_kinds[index] & Node::kCopied ? m_copies.data() : m_source;
+    return std::u16string_view(base + node.payload, node.size);
+  }
+  void Reset();
+  // Parses `text`, which is NUL-terminated and outlives the document.
+  bool Read(std::u16string_view text, ZelStringT<char16_t>& errorText);
+
+  std::u16string m_owned;            // the text, when Parse copied it
+  const char16_t* m_source;          // the parsed text, after a byte order mark
+  std::u16string m_copies;           // the decoded strings that had escapes
+  std::vector<double> m_numbers;     // the numbers, in text order
+  std::vector<Node> m_nodes;         // children before parents; the root last
+  std::vector<std::uint8_t> m_kinds; // the kind of each node
 };
 
 /// Writes JSON text piece by piece, in the layouts of ValueToString, without

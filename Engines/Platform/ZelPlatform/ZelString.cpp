@@ -5,6 +5,7 @@
 #include <unicode/utf16.h>
 #include <unicode/utf8.h>
 
+#include <algorithm>
 #include <cassert>
 #include <cstdarg>
 #include <cstdint>
@@ -123,36 +124,59 @@ void ReplaceUnpairedSurrogates(std::u16string_view text, std::u16string& out) {
   }
 }
 
+namespace {
+
+// Writes the full folding of `run`, a text without ASCII units, into `out`
+// from `at`, growing `out` so that `rest` more units still fit after it;
+// returns the folding's length.
+std::size_t FoldRun(std::u16string_view run, std::u16string& out, std::size_t at,
+                    std::size_t rest) {
+  std::u16string repaired;
+  if (HasUnpairedSurrogate(run)) {
+    ReplaceUnpairedSurrogates(run, repaired);
+    run = repaired;
+  }
+  assert(run.size() <= static_cast<std::size_t>(std::numeric_limits<int32_t>::max() / 3));
+  // Full folding grows a text by at most three times; short runs fold on the stack.
+  char16_t fixed[96];
+  std::u16string grown;
+  char16_t* folded = fixed;
+  if (run.size() * 3 > sizeof fixed / sizeof fixed[0]) {
+    grown.resize(run.size() * 3);
+    folded = grown.data();
+  }
+  UErrorCode status = U_ZERO_ERROR;
+  int32_t length = u_strFoldCase(folded, static_cast<int32_t>(run.size() * 3), run.data(),
+                                 static_cast<int32_t>(run.size()), U_FOLD_CASE_DEFAULT, &status);
+  if (U_FAILURE(status)) { // cannot happen with a large enough buffer
+    folded = const_cast<char16_t*>(run.data());
+    length = static_cast<int32_t>(run.size());
+  }
+  const auto count = static_cast<std::size_t>(length);
+  if (at + count + rest > out.size())
+    out.resize(at + count + rest);
+  std::copy(folded, folded + count, out.begin() + static_cast<std::ptrdiff_t>(at));
+  return count;
+}
+
+} // namespace
+
 void FoldCaseUtf16(std::u16string_view text, std::u16string& out) {
   out.resize(text.size());
+  std::size_t length = 0;
   std::size_t i = 0;
-  for (; i < text.size(); ++i) {
-    const char16_t c = text[i];
-    if (c >= 0x80)
-      break;
-    out[i] = static_cast<char16_t>(FoldAscii(c));
+  while (i < text.size()) {
+    for (; i < text.size() && text[i] < 0x80; ++i)
+      out[length++] = static_cast<char16_t>(FoldAscii(text[i]));
+    // Full folding maps each code point on its own, so the runs between
+    // ASCII units fold apart; an ASCII unit never splits a surrogate pair.
+    const std::size_t start = i;
+    while (i < text.size() && text[i] >= 0x80)
+      ++i;
+    if (i > start)
+      length += FoldRun(text.substr(start, i - start), out, length, text.size() - i);
   }
-  if (i == text.size())
-    return;
-  // Beyond ASCII, ICU folds the rest (after repairing unpaired surrogates).
-  std::u16string rest;
-  std::u16string_view source = text.substr(i);
-  if (HasUnpairedSurrogate(source)) {
-    ReplaceUnpairedSurrogates(source, rest);
-    source = rest;
-  }
-  assert(source.size() <= static_cast<std::size_t>(std::numeric_limits<int32_t>::max() / 3));
-  // Full folding grows a text by at most three times.
-  std::u16string folded(source.size() * 3, u'\0');
-  UErrorCode status = U_ZERO_ERROR;
-  const int32_t length =
-      u_strFoldCase(folded.data(), static_cast<int32_t>(folded.size()), source.data(),
-                    static_cast<int32_t>(source.size()), U_FOLD_CASE_DEFAULT, &status);
-  out.resize(i);
-  if (U_FAILURE(status))
-    out.append(source); // cannot happen with a large enough buffer
-  else
-    out.append(folded.data(), static_cast<std::size_t>(length));
+  out.resize(length);
 }
 
 int CompareCodePointOrder(std::u16string_view a, std::u16string_view b) noexcept {

@@ -211,11 +211,12 @@ bool StyleSheet::ImportFromString(const ZelStringT<char16_t>& text, bool replace
     Json::Object* document = value.GetIf<Json::Object>();
     return document && ImportJson(document, replace);
   }
-  // The same import as ImportJson's, read from a compact parse of the text.
+  // The same import as ImportJson's, read from a compact parse of the text,
+  // whose strings stay in `text`.
   Json::Document document;
   ZelStringT<char16_t> errorText;
   try {
-    if (!document.Parse(text, errorText))
+    if (!document.ParseBorrowed(text, errorText))
       return false;
   } catch (...) {
     return false;

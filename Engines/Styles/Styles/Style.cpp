@@ -79,8 +79,7 @@ void Style::DestroyValuesAndTakeLinks(const Style& source) {
   DestroyOwnValues();
   m_parent = source.m_parent;
   m_category = source.m_category;
-  m_externalID = source.m_externalID;
-  m_externalName = source.m_externalName;
+  m_external.reset(source.m_external ? new ExternalNames(*source.m_external) : nullptr);
 }
 
 void Style::DestroyOwnValues() noexcept {
@@ -139,22 +138,44 @@ PropertyKey Style::GetCategoryName() const noexcept {
   return m_category ? m_category->GetKey() : PropertyKey::Empty;
 }
 
-void Style::SetExternalField(ZelStringT<char16_t> Style::*field, const ZelStringT<char16_t>& text) {
-  this->*field = text;
+void Style::SetExternalField(ZelStringT<char16_t> ExternalNames::*field,
+                             const ZelStringT<char16_t>& text) {
+  const auto set = [&](Style& style) {
+    if (!style.m_external && !text.IsEmpty())
+      style.m_external.reset(new ExternalNames);
+    if (style.m_external)
+      style.m_external.get()->*field = text;
+  };
+  set(*this);
   // Ordinary styles pass the field on to their direct single substyles only.
   if (GetCategoryName() != StyleCategoryName)
     return;
   for (const PropertyMap::Entry& entry : m_properties)
     if (Style* substyle = GetSubstyle(entry.first, false))
-      substyle->*field = text;
+      set(*substyle);
 }
 
 void Style::SetExternalID(const ZelStringT<char16_t>& id) {
-  SetExternalField(&Style::m_externalID, id);
+  SetExternalField(&ExternalNames::id, id);
 }
 
 void Style::SetExternalName(const ZelStringT<char16_t>& name) {
-  SetExternalField(&Style::m_externalName, name);
+  SetExternalField(&ExternalNames::name, name);
+}
+
+namespace {
+const ZelStringT<char16_t>& EmptyText() noexcept {
+  static const ZelStringT<char16_t> empty;
+  return empty;
+}
+} // namespace
+
+const ZelStringT<char16_t>& Style::GetExternalID() const noexcept {
+  return m_external ? m_external->id : EmptyText();
+}
+
+const ZelStringT<char16_t>& Style::GetExternalName() const noexcept {
+  return m_external ? m_external->name : EmptyText();
 }
 
 void Style::RepairSubstyleOwnerPointers() {
@@ -167,8 +188,7 @@ void Style::SwapData(Style& other) {
   std::swap(m_category, other.m_category);
   std::swap(m_parent, other.m_parent);
   m_properties.Swap(other.m_properties);
-  std::swap(m_externalID, other.m_externalID);
-  std::swap(m_externalName, other.m_externalName);
+  std::swap(m_external, other.m_external);
   RepairSubstyleOwnerPointers();
   other.RepairSubstyleOwnerPointers();
 }
@@ -176,8 +196,7 @@ void Style::SwapData(Style& other) {
 bool Style::operator==(const Style& other) const {
   if (m_category != other.m_category || m_parent != other.m_parent)
     return false;
-  if (m_externalID.Compare(other.m_externalID, kCompareCaseSensitive) != 0 ||
-      m_externalName.Compare(other.m_externalName, kCompareCaseSensitive) != 0)
+  if (GetExternalID() != other.GetExternalID() || GetExternalName() != other.GetExternalName())
     return false;
   if (m_properties.size() != other.m_properties.size())
     return false;
@@ -198,9 +217,9 @@ bool Style::operator<(const Style& other) const {
     return std::less<const StyleCategory*>()(m_category.get(), other.m_category.get());
   if (m_parent != other.m_parent)
     return std::less<const Style*>()(m_parent, other.m_parent);
-  if (const int c = m_externalID.Compare(other.m_externalID, kCompareCaseSensitive))
+  if (const int c = GetExternalID().Compare(other.GetExternalID(), kCompareCaseSensitive))
     return c < 0;
-  if (const int c = m_externalName.Compare(other.m_externalName, kCompareCaseSensitive))
+  if (const int c = GetExternalName().Compare(other.GetExternalName(), kCompareCaseSensitive))
     return c < 0;
   if (m_properties.size() != other.m_properties.size())
     return m_properties.size() < other.m_properties.size();

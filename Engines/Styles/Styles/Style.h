@@ -217,12 +217,12 @@ public:
   ///@{
 
   /// The ID and name of the external style; empty when not set.
-  const ZelStringT<char16_t>& GetExternalID() const noexcept { return m_externalID; }
-  const ZelStringT<char16_t>& GetExternalName() const noexcept { return m_externalName; }
+  const ZelStringT<char16_t>& GetExternalID() const noexcept;
+  const ZelStringT<char16_t>& GetExternalName() const noexcept;
   ///@}
 
   /// True when the style has an external ID.
-  bool IsExternal() const noexcept { return !m_externalID.IsEmpty(); }
+  bool IsExternal() const noexcept { return m_external && !m_external->id.IsEmpty(); }
   /// The own values in key order.
   const PropertyMap& GetProperties() const noexcept { return m_properties; }
 
@@ -433,7 +433,13 @@ private:
   void DestroyOwnValues() noexcept;
   // DestroyOwnValues, then the source's parent, category and strings.
   void DestroyValuesAndTakeLinks(const Style& source);
-  void SetExternalField(ZelStringT<char16_t> Style::*field, const ZelStringT<char16_t>& text);
+  // The external ID and name, held apart since few styles have them.
+  struct ExternalNames {
+    ZelStringT<char16_t> id;
+    ZelStringT<char16_t> name;
+  };
+  void SetExternalField(ZelStringT<char16_t> ExternalNames::*field,
+                        const ZelStringT<char16_t>& text);
   // Takes over the parent's own values, then inherits from its parent.
   void MergeParent();
   // Whether one of the style's own values depends on `styles`.
@@ -452,8 +458,7 @@ private:
   Style* m_owner = nullptr;
   PropertyKey m_ownerPropertyKey;
   std::shared_ptr<const StyleCategory> m_category;
-  ZelStringT<char16_t> m_externalID;
-  ZelStringT<char16_t> m_externalName;
+  std::unique_ptr<ExternalNames> m_external; // null while both are empty
 };
 
 } // namespace Styles

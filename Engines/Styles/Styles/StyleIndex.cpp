@@ -6,7 +6,9 @@
 #include <Styles/Style.h>
 
 #include <algorithm>
+#include <cassert>
 #include <iterator>
+#include <limits>
 
 namespace Styles {
 namespace detail {
@@ -24,15 +26,21 @@ StyleIndex::Entry* StyleIndex::Add(std::u16string_view name, std::u16string_view
   MakeRoomForOne(m_pending);
   m_byName.Reserve(m_byName.Size() + 1);
   m_byStyle.Reserve(m_byStyle.Size() + 1);
-  if (m_free.empty())
+  if (m_free.empty()) {
+    // A slot holds the position in 32 bits, far beyond what memory allows.
+    assert(m_entries.size() < std::numeric_limits<std::uint32_t>::max());
     m_entries.emplace_back();
+    m_entries.back().position = static_cast<std::uint32_t>(m_entries.size() - 1);
+  }
   // Nothing below throws.
   Entry* entry = &m_entries.back();
   if (!m_free.empty()) {
     entry = m_free.back();
     m_free.pop_back();
   }
+  const std::uint32_t position = entry->position;
   *entry = Entry();
+  entry->position = position;
   entry->style = style;
   entry->text = std::move(text);
   entry->nameLength = static_cast<std::uint32_t>(name.size());

@@ -161,15 +161,16 @@ bool StyleProperty::Deserialize(const StyleSheet&, Style* style, const JsonValue
   assert(style);
   if (!m_policy)
     return false;
-  ZelStringT<char16_t> text;
-  if (const auto* string = in.GetIf<ZelStringT<char16_t>>())
-    text = *string;
-  else if (const double* number = in.GetIf<double>())
-    text = ZelStringT<char16_t>::FormatInternal("%g", *number);
-  else if (const bool* flag = in.GetIf<bool>())
-    text = *flag ? u"1" : u"0";
-  else
+  // A string value is read where it is; numbers and flags become text first.
+  ZelStringT<char16_t> converted;
+  const ZelStringT<char16_t>* string = in.GetIf<ZelStringT<char16_t>>();
+  if (const double* number = string ? nullptr : in.GetIf<double>())
+    converted = ZelStringT<char16_t>::FormatInternal("%g", *number);
+  else if (const bool* flag = string ? nullptr : in.GetIf<bool>())
+    converted = *flag ? u"1" : u"0";
+  else if (!string)
     return false;
+  const ZelStringT<char16_t>& text = string ? *string : converted;
 
   try {
     style->SetProperty(GetName(), m_policy->FromText(text));

@@ -156,6 +156,8 @@ TEST(JsonTest, BadTextFailsAndLeavesValueAlone) {
       {"truncated", {u"{\"a\":1", u"\"abc", u"tru"}},
       {"trailing text", {u"{} {}", u"[1]x", Text(nulInside, 5)}},
       {"syntax", {u"[1,]", u"'a'", u"{a:1}", u"01", u"NaN", u"\"a\nb\""}},
+      // What follows a number is not part of it, even when it looks like more number.
+      {"after a number", {u"[01e999]", u"[1-9e999]", u"[2.5.1e999]", u"[-0.0e+1e999]"}},
       {"invalid escape", {u"\"\\x\"", u"\"\\u12\""}},
       {"number too big",
        {u"1e400", u"[10e308]", u"1.7976931348623159e308", u"1e99999999999999",

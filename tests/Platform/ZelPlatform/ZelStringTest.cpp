@@ -75,6 +75,25 @@ TEST(ZelStringTest, CompareNoCaseFoldsFullUnicode) {
             -Sign(ZelStringT<char>("x").CompareNoCase("\xC3")));
 }
 
+// Folding goes by runs: ASCII by itself, each run between ASCII units through
+// the Unicode tables (on the stack up to 32 units, on the heap beyond).
+TEST(ZelStringTest, FoldCaseFoldsEachRunInPlace) {
+  struct Case {
+    std::u16string in, expected;
+  };
+  const Case cases[] = {
+      {u"\u00dcberschrift 12", u"\u00fcberschrift 12"},
+      {u"Stra\u00dfe \u03a3\u0391\u03a3 X\U00010400", u"strasse \u03c3\u03b1\u03c3 x\U00010428"},
+      {std::u16string(40, u'\u00c4') + u"B", std::u16string(40, u'\u00e4') + u"b"},
+      {u"A" + kLoneSurrogate + u"\u00c4" + kLoneSurrogate, u"a\uFFFD\u00e4\uFFFD"},
+  };
+  std::u16string folded = u"stale";
+  for (const Case& c : cases) {
+    ZelPlatform::detail::FoldCaseUtf16(c.in, folded);
+    EXPECT_EQ(Narrow(folded), Narrow(c.expected)) << Narrow(c.in);
+  }
+}
+
 TEST(ZelStringTest, TrimRemovesUnicodeWhiteSpace) {
   struct Case {
     std::u16string in;

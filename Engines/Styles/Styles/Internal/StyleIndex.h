@@ -43,6 +43,7 @@ public:
     std::uint32_t foldedStart = 0;
     std::uint32_t foldedLength = 0;
     std::uint32_t importStamp = 0; // the import that filed the style held here
+    std::uint32_t position = 0;    // where the entry sits in the index's deque
     bool listed = true;            // in the name index (and so in name order)
     bool erased = false;
 
@@ -122,8 +123,8 @@ private:
   mutable bool m_stale = false;          // names dropped since then
   mutable std::size_t m_erased = 0;
   std::uint32_t m_importStamps = 0;
-  EntryTable<Entry, FoldedOf> m_byName;
-  EntryTable<Entry, StyleOf> m_byStyle;
+  EntryTable<Entry, FoldedOf> m_byName{m_entries};
+  EntryTable<Entry, StyleOf> m_byStyle{m_entries};
 };
 
 } // namespace detail
