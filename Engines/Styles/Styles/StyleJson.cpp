@@ -10,9 +10,12 @@
 #include <Styles/Internal/JsonAccess.h>
 
 #include <Json/Json.h>
+#include <ZelPref/ConversionPolicy.h>
 
+#include <cmath>
 #include <memory>
 #include <optional>
+#include <typeinfo>
 #include <utility>
 #include <vector>
 
@@ -34,6 +37,9 @@ public:
   }
   Json::Value& Value() { return m_value = Json::Value(); }
   void Member(const ZelStringT<char16_t>& name) { m_object.AddValue(name, std::move(m_value)); }
+  bool Plain(const BaseStyleProperty&, const StyleSheet&, const ZelUtils::Any&, const PropertyKey&) {
+    return false;
+  }
 
 private:
   Json::Object& m_object;
@@ -52,6 +58,38 @@ public:
   void Member(const ZelStringT<char16_t>& name) {
     m_writer.Key(name.GetView());
     m_writer.Write(m_value);
+  }
+  // A plain property with a stock text or number policy: the member its
+  // Serialize would give, written without making a string or a value. False
+  // when the general way must be taken (it also throws what Serialize throws).
+  bool Plain(const BaseStyleProperty& behaviour, const StyleSheet& sheet,
+             const ZelUtils::Any& value, const PropertyKey& name) {
+    if (typeid(behaviour) != typeid(StyleProperty))
+      return false;
+    const ZelPref::ConversionPolicy* policy = behaviour.GetConversionPolicy();
+    if (!policy)
+      return false;
+    const bool isText = typeid(*policy) == typeid(ZelPref::TextConversionPolicy);
+    if (!isText && typeid(*policy) != typeid(ZelPref::NumberConversionPolicy))
+      return false;
+    if (sheet.GetVersion() < behaviour.GetMinimumVersion())
+      return true;
+    if (isText) {
+      const auto* text = value.GetIf<ZelStringT<char16_t>>();
+      if (!text)
+        return false;
+      m_writer.Key(name.GetView());
+      m_writer.String(text->GetView());
+      return true;
+    }
+    const double* number = value.GetIf<double>();
+    if (!number || !std::isfinite(*number))
+      return false;
+    char16_t digits[ZelPref::NumberConversionPolicy::kMaxTextLength];
+    const char16_t* end = ZelPref::NumberConversionPolicy::WriteText(*number, digits);
+    m_writer.Key(name.GetView());
+    m_writer.String(std::u16string_view(digits, static_cast<std::size_t>(end - digits)));
+    return true;
   }
 
 private:
@@ -76,6 +114,8 @@ void StyleJson::WriteMembers(const Style& style, const StyleSheet& sheet, bool i
   for (const PropertyMap::Entry& entry : style.GetProperties()) {
     const BaseStyleProperty* behaviour = style.FindBehaviour(entry.first);
     if (!behaviour || (!includeTemporary && behaviour->IsTemporary()))
+      continue;
+    if (sink.Plain(*behaviour, sheet, entry.second, entry.first))
       continue;
     if (behaviour->Serialize(sheet, &style, entry.second, sink.Value()))
       sink.Member(entry.first.GetString());

@@ -1,0 +1,140 @@
+#include <Internal/JsonText.h>
+
+#include <algorithm>
+#include <cstring>
+
+namespace Json {
+namespace detail {
+
+std::u16string TextOutput::Take() {
+  std::u16string text(m_units.get(), m_size);
+  m_units.reset();
+  m_size = m_capacity = 0;
+  return text;
+}
+
+void TextOutput::Grow(std::size_t count) {
+  const std::size_t capacity = std::max(m_capacity * 2, m_size + count + 1024);
+  std::unique_ptr<Ch[]> units(new Ch[capacity]);
+  std::copy(m_units.get(), m_units.get() + m_size, units.get());
+  m_units = std::move(units);
+  m_capacity = capacity;
+}
+
+namespace {
+
+constexpr char16_t kHexDigits[] = u"0123456789ABCDEF";
+
+bool IsHighSurrogate(char16_t c) { return (c & 0xFC00) == 0xD800; }
+bool IsLowSurrogate(char16_t c) { return (c & 0xFC00) == 0xDC00; }
+
+// Writes the unit `c` that needs more than a copy (a control character, a
+// quote, a backslash or a surrogate); `next` is the unit after it, which a
+// paired surrogate takes too. Returns the end of what was written.
+char16_t* WriteSpecial(char16_t c, const char16_t*& next, const char16_t* end, char16_t* out) {
+  if (c >= 0xD800) {
+    if (IsHighSurrogate(c) && next != end && IsLowSurrogate(*next)) {
+      *out++ = c;
+      *out++ = *next++;
+    } else {
+      *out++ = u'\uFFFD';
+    }
+    return out;
+  }
+  *out++ = u'\\';
+  switch (c) {
+  case u'"':
+  case u'\\':
+    *out++ = c;
+    break;
+  case u'\b':
+    *out++ = u'b';
+    break;
+  case u'\t':
+    *out++ = u't';
+    break;
+  case u'\n':
+    *out++ = u'n';
+    break;
+  case u'\f':
+    *out++ = u'f';
+    break;
+  case u'\r':
+    *out++ = u'r';
+    break;
+  default:
+    *out++ = u'u';
+    *out++ = u'0';
+    *out++ = u'0';
+    *out++ = kHexDigits[c >> 4];
+    *out++ = kHexDigits[c & 0xF];
+  }
+  return out;
+}
+
+} // namespace
+
+bool CompactWriter::String(const char16_t* text, std::size_t length) {
+  if (!Prefix(true))
+    return false;
+  // At most six units for each unit of the text, and the quotes.
+  char16_t* out = m_out.Claim(2 + 6 * length);
+  *out++ = u'"';
+  const char16_t* const end = text + length;
+  while (text != end) {
+    const char16_t c = *text++;
+    if (c >= 0x20 && c != u'"' && c != u'\\' && (c & 0xF800) != 0xD800)
+      *out++ = c;
+    else
+      out = WriteSpecial(c, text, end, out);
+  }
+  *out++ = u'"';
+  m_out.Commit(out);
+  return true;
+}
+
+bool CompactWriter::Prefix(bool isString) {
+  if (m_levels.empty()) {
+    if (m_hasRoot)
+      return false;
+    m_hasRoot = true;
+    return true;
+  }
+  Level& level = m_levels.back();
+  const bool isName = !level.inArray && level.valueCount % 2 == 0;
+  if (isName && !isString)
+    return false;
+  if (level.valueCount > 0)
+    m_out.Put(level.inArray || isName ? u',' : u':');
+  ++level.valueCount;
+  return true;
+}
+
+bool CompactWriter::Open(bool isArray, char16_t bracket) {
+  if (!Prefix(false))
+    return false;
+  m_levels.push_back(Level{0, isArray});
+  m_out.Put(bracket);
+  return true;
+}
+
+bool CompactWriter::Close(bool isArray, char16_t bracket) {
+  if (m_levels.empty() || m_levels.back().inArray != isArray ||
+      (!isArray && m_levels.back().valueCount % 2 != 0))
+    return false;
+  m_levels.pop_back();
+  m_out.Put(bracket);
+  return true;
+}
+
+bool CompactWriter::Raw(const char16_t* text, std::size_t length) {
+  if (!Prefix(false))
+    return false;
+  char16_t* out = m_out.Claim(length);
+  std::memcpy(out, text, length * sizeof(char16_t));
+  m_out.Commit(out + length);
+  return true;
+}
+
+} // namespace detail
+} // namespace Json
