@@ -1,6 +1,7 @@
 #include <Internal/JsonText.h>
 
 #include <algorithm>
+#include <cstdint>
 #include <cstring>
 
 namespace Json {
@@ -27,6 +28,18 @@ constexpr char16_t kHexDigits[] = u"0123456789ABCDEF";
 
 bool IsHighSurrogate(char16_t c) { return (c & 0xFC00) == 0xD800; }
 bool IsLowSurrogate(char16_t c) { return (c & 0xFC00) == 0xDC00; }
+
+// True when one of four units (in one word) may need more than a copy: a
+// control character, a quote, a backslash or a surrogate. A lane flags when
+// it is zero after the lane's test; a borrow only flags lanes above a true one.
+bool NeedsCare(std::uint64_t units) {
+  constexpr std::uint64_t kOnes = 0x0001000100010001ull;
+  constexpr std::uint64_t kHighs = 0x8000800080008000ull;
+  const auto hasZero = [](std::uint64_t x) { return (x - kOnes) & ~x & kHighs; };
+  const std::uint64_t control = (units - 0x20 * kOnes) & ~units & kHighs;
+  return (control | hasZero(units ^ (u'"' * kOnes)) | hasZero(units ^ (u'\\' * kOnes)) |
+          hasZero((units & (0xF800 * kOnes)) ^ (0xD800 * kOnes))) != 0;
+}
 
 // Writes the unit `c` that needs more than a copy (a control character, a
 // quote, a backslash or a surrogate); `next` is the unit after it, which a
@@ -82,6 +95,16 @@ bool CompactWriter::String(const char16_t* text, std::size_t length) {
   *out++ = u'"';
   const char16_t* const end = text + length;
   while (text != end) {
+    if (end - text >= 4) {
+      std::uint64_t units;
+      std::memcpy(&units, text, sizeof units);
+      if (!NeedsCare(units)) {
+        std::memcpy(out, &units, sizeof units);
+        text += 4;
+        out += 4;
+        continue;
+      }
+    }
     const char16_t c = *text++;
     if (c >= 0x20 && c != u'"' && c != u'\\' && (c & 0xF800) != 0xD800)
       *out++ = c;

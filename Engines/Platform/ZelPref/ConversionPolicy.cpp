@@ -113,9 +113,12 @@ char* ShortDecimal(double value, char* out) {
     return out;
   }
   const double scaled = value * 1000.0;
-  if (!(std::fabs(scaled) < 1e15) || std::nearbyint(scaled) != scaled)
+  if (!(std::fabs(scaled) < 1e15))
     return nullptr;
+  // Whole when the conversion, which drops any fraction, loses nothing.
   const long long thousandths = static_cast<long long>(scaled);
+  if (static_cast<double>(thousandths) != scaled)
+    return nullptr;
   // Exactly the double that the decimal reads back as: with at most fifteen
   // significant digits no shorter decimal reads back the same.
   if (static_cast<double>(thousandths) / 1000.0 != value)
