@@ -116,20 +116,10 @@ bool CompactWriter::String(const char16_t* text, std::size_t length) {
   return true;
 }
 
-bool CompactWriter::Prefix(bool isString) {
-  if (m_levels.empty()) {
-    if (m_hasRoot)
-      return false;
-    m_hasRoot = true;
-    return true;
-  }
-  Level& level = m_levels.back();
-  const bool isName = !level.inArray && level.valueCount % 2 == 0;
-  if (isName && !isString)
+bool CompactWriter::Root() {
+  if (m_hasRoot)
     return false;
-  if (level.valueCount > 0)
-    m_out.Put(level.inArray || isName ? u',' : u':');
-  ++level.valueCount;
+  m_hasRoot = true;
   return true;
 }
 

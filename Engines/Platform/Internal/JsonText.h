@@ -78,7 +78,19 @@ private:
   };
 
   // The separator before a value; false when a value cannot go here.
-  bool Prefix(bool isString);
+  bool Prefix(bool isString) {
+    if (m_levels.empty())
+      return Root();
+    Level& level = m_levels.back();
+    const bool isName = !level.inArray && level.valueCount % 2 == 0;
+    if (isName && !isString)
+      return false;
+    if (level.valueCount++ > 0)
+      m_out.Put(level.inArray || isName ? u',' : u':');
+    return true;
+  }
+  // The same for the value at the root: there is only one.
+  bool Root();
   bool Open(bool isArray, char16_t bracket);
   bool Close(bool isArray, char16_t bracket);
   bool Raw(const char16_t* text, std::size_t length);

@@ -131,19 +131,18 @@ char* ShortDecimal(double value, char* out) {
     magnitude /= 10;
     --decimals;
   }
-  // to_chars writes the exponent form when it is shorter than the fixed one.
-  unsigned long long significant = magnitude;
-  while (significant % 10 == 0)
-    significant /= 10;
   const int digits = DigitCount(magnitude);
-  const int significantDigits = DigitCount(significant);
-  const int fixedLength = decimals > 0 ? std::max(digits, decimals + 1) + 1 : digits;
-  const int exponent = digits - 1 - decimals;
-  const int exponentDigits = std::abs(exponent) >= 100 ? 3 : 2;
-  const int scientificLength =
-      significantDigits + (significantDigits > 1 ? 1 : 0) + 2 + exponentDigits;
-  if (fixedLength > scientificLength)
-    return nullptr;
+  // to_chars writes the exponent form when it is shorter than the fixed one,
+  // which only a whole number ending in zeros can be.
+  if (decimals == 0) {
+    unsigned long long significant = magnitude;
+    while (significant % 10 == 0)
+      significant /= 10;
+    const int significantDigits = DigitCount(significant);
+    const int exponentDigits = digits - 1 >= 100 ? 3 : 2;
+    if (digits > significantDigits + (significantDigits > 1 ? 1 : 0) + 2 + exponentDigits)
+      return nullptr;
+  }
   if (value < 0)
     *out++ = '-';
   // The digits from the last, the point after the first `decimals` of them;
