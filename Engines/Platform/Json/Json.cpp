@@ -550,8 +550,7 @@ namespace {
 
 template <class RapidWriter> struct WriterOf final : Writer::Impl {
   WriterOf() : writer(buffer), tree(writer) {
-    if constexpr (std::is_same<RapidWriter,
-                                 rapidjson::PrettyWriter<Buffer, Utf16, Utf16>>::value)
+    if constexpr (std::is_same<RapidWriter, rapidjson::PrettyWriter<Buffer, Utf16, Utf16>>::value)
       writer.SetIndent(' ', 2);
   }
   bool StartObject() override { return writer.StartObject(); }

@@ -69,7 +69,8 @@ BaseStyleProperty* StyleCategory::GetStyleProperty(const PropertyKey& key) const
   // An open-addressing table by key identity, half full at most.
   if (m_byKey.empty())
     return nullptr;
-  for (std::size_t slot = FirstSlot(key, m_byKey.size());; slot = (slot + 1) & (m_byKey.size() - 1)) {
+  for (std::size_t slot = FirstSlot(key, m_byKey.size());;
+       slot = (slot + 1) & (m_byKey.size() - 1)) {
     const auto& entry = m_byKey[slot];
     if (!entry.second || entry.first == key)
       return entry.second;

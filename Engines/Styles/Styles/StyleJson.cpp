@@ -38,7 +38,8 @@ public:
   }
   Json::Value& Value() { return m_value = Json::Value(); }
   void Member(const ZelStringT<char16_t>& name) { m_object.AddValue(name, std::move(m_value)); }
-  bool Plain(const BaseStyleProperty&, const StyleSheet&, const ZelUtils::Any&, const PropertyKey&) {
+  bool Plain(const BaseStyleProperty&, const StyleSheet&, const ZelUtils::Any&,
+             const PropertyKey&) {
     return false;
   }
 
