@@ -85,13 +85,9 @@ char16_t* WriteSpecial(char16_t c, const char16_t*& next, const char16_t* end, c
   return out;
 }
 
-} // namespace
-
-bool CompactWriter::String(const char16_t* text, std::size_t length) {
-  if (!Prefix(true))
-    return false;
-  // At most six units for each unit of the text, and the quotes.
-  char16_t* out = m_out.Claim(2 + 6 * length);
+// Writes `text` quoted and escaped at `out` (room for 2 + 6 * length units)
+// and returns the end of it.
+char16_t* WriteQuoted(const char16_t* text, std::size_t length, char16_t* out) {
   *out++ = u'"';
   const char16_t* const end = text + length;
   while (text != end) {
@@ -112,7 +108,31 @@ bool CompactWriter::String(const char16_t* text, std::size_t length) {
       out = WriteSpecial(c, text, end, out);
   }
   *out++ = u'"';
-  m_out.Commit(out);
+  return out;
+}
+
+} // namespace
+
+bool CompactWriter::String(const char16_t* text, std::size_t length) {
+  if (!Prefix(true))
+    return false;
+  // At most six units for each unit of the text, and the quotes.
+  m_out.Commit(WriteQuoted(text, length, m_out.Claim(2 + 6 * length)));
+  return true;
+}
+
+bool CompactWriter::Member(const char16_t* name, std::size_t nameLength, const char16_t* text,
+                           std::size_t textLength) {
+  if (m_levels.empty() || m_levels.back().inArray || m_levels.back().valueCount % 2 != 0)
+    return String(name, nameLength) && String(text, textLength);
+  Level& level = m_levels.back();
+  char16_t* out = m_out.Claim(6 + 6 * (nameLength + textLength));
+  if (level.valueCount > 0)
+    *out++ = u',';
+  level.valueCount += 2;
+  out = WriteQuoted(name, nameLength, out);
+  *out++ = u':';
+  m_out.Commit(WriteQuoted(text, textLength, out));
   return true;
 }
 

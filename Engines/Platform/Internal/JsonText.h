@@ -65,6 +65,9 @@ public:
   // A name is written as a string; so is a string where a name belongs.
   bool Key(const char16_t* text, std::size_t length) { return String(text, length); }
   bool String(const char16_t* text, std::size_t length);
+  // A name and its string value, as Key and then String write them.
+  bool Member(const char16_t* name, std::size_t nameLength, const char16_t* text,
+              std::size_t textLength);
   bool Bool(bool flag) { return flag ? Raw(u"true", 4) : Raw(u"false", 5); }
   bool Null() { return Raw(u"null", 4); }
   // Text written as it is, such as a number's digits; the kind is not used.

@@ -267,6 +267,18 @@ public:
     }
   }
 
+  // A name and its string value.
+  bool WriteMember(std::u16string_view name, std::u16string_view text) {
+    if constexpr (RepairsSurrogates<Writer>::value) {
+      if (name.size() > std::numeric_limits<SizeType>::max() ||
+          text.size() > std::numeric_limits<SizeType>::max())
+        return false;
+      return m_writer.Member(name.data(), name.size(), text.data(), text.size());
+    } else {
+      return WriteText(name, true) && WriteText(text, false);
+    }
+  }
+
   bool WriteText(std::u16string_view text, bool isKey) {
     if (text.size() > std::numeric_limits<SizeType>::max())
       return false;
@@ -538,6 +550,7 @@ struct Writer::Impl {
   virtual bool StartArray() = 0;
   virtual bool EndArray() = 0;
   virtual bool Text(std::u16string_view text, bool isKey) = 0;
+  virtual bool Member(std::u16string_view name, std::u16string_view text) = 0;
   virtual bool Write(const Value& value) = 0;
   virtual bool IsComplete() const = 0;
 
@@ -558,6 +571,9 @@ template <class RapidWriter> struct WriterOf final : Writer::Impl {
   bool StartArray() override { return writer.StartArray(); }
   bool EndArray() override { return writer.EndArray(); }
   bool Text(std::u16string_view text, bool isKey) override { return tree.WriteText(text, isKey); }
+  bool Member(std::u16string_view name, std::u16string_view text) override {
+    return tree.WriteMember(name, text);
+  }
   bool Write(const Value& value) override { return tree.Write(value); }
   bool IsComplete() const override { return writer.IsComplete(); }
 
@@ -591,6 +607,9 @@ bool Writer::Key(std::u16string_view name) {
 }
 bool Writer::String(std::u16string_view text) {
   return Check(!m_impl->failed && m_impl->Text(text, false));
+}
+bool Writer::Member(std::u16string_view name, std::u16string_view text) {
+  return Check(!m_impl->failed && m_impl->Member(name, text));
 }
 bool Writer::Write(const Value& value) { return Check(!m_impl->failed && m_impl->Write(value)); }
 

@@ -53,10 +53,7 @@ class WriterSink {
 public:
   WriterSink(Json::Writer& writer, detail::StyleJson::TextScratch& scratch)
       : m_writer(writer), m_scratch(scratch) {}
-  void Text(std::u16string_view name, std::u16string_view text) {
-    m_writer.Key(name);
-    m_writer.String(text);
-  }
+  void Text(std::u16string_view name, std::u16string_view text) { m_writer.Member(name, text); }
   Json::Value& Value() { return m_scratch.value; }
   void Member(const ZelStringT<char16_t>& name) {
     m_writer.Key(name.GetView());
@@ -77,8 +74,7 @@ public:
       const auto* text = value.GetIf<ZelStringT<char16_t>>();
       if (!text)
         return false;
-      m_writer.Key(name.GetView());
-      m_writer.String(text->GetView());
+      m_writer.Member(name.GetView(), text->GetView());
       return true;
     }
     const double* number = value.GetIf<double>();
@@ -86,8 +82,8 @@ public:
       return false;
     char16_t digits[ZelPref::NumberConversionPolicy::kMaxTextLength];
     const char16_t* end = ZelPref::NumberConversionPolicy::WriteText(*number, digits);
-    m_writer.Key(name.GetView());
-    m_writer.String(std::u16string_view(digits, static_cast<std::size_t>(end - digits)));
+    m_writer.Member(name.GetView(),
+                    std::u16string_view(digits, static_cast<std::size_t>(end - digits)));
     return true;
   }
 

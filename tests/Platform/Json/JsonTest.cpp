@@ -149,16 +149,18 @@ TEST(JsonTest, CompactStringsAreEscapedExactly) {
 }
 
 // Pieces out of place lose the whole text, as an unfinished one does. Steps:
-// { } [ ] open and close, k a name, s a string, n a number.
+// { } [ ] open and close, k a name, s a string, m both, n a number.
 TEST(JsonTest, WriterRefusesPiecesOutOfPlace) {
   struct Case {
     const char* steps;
     const char16_t* text;
   };
-  for (const Case& c : {Case{"{kn}", u"{\"k\":1}"}, Case{"[sn[]{}]", u"[\"s\",1,[],{}]"},
-                        Case{"{k{}k[]}", u"{\"k\":{},\"k\":[]}"}, Case{"{n}", u""},
-                        Case{"{k}", u""}, Case{"{k[}", u""}, Case{"[}", u""}, Case{"{]", u""},
-                        Case{"ss", u""}, Case{"[", u""}, Case{"}", u""}, Case{"", u""}}) {
+  for (const Case& c :
+       {Case{"{kn}", u"{\"k\":1}"}, Case{"[sn[]{}]", u"[\"s\",1,[],{}]"},
+        Case{"{k{}k[]}", u"{\"k\":{},\"k\":[]}"}, Case{"{mkn}", u"{\"k\":\"s\",\"k\":1}"},
+        Case{"[m]", u"[\"k\",\"s\"]"}, Case{"{kmn}", u"{\"k\":\"k\",\"s\":1}"}, Case{"{n}", u""},
+        Case{"{k}", u""}, Case{"{k[}", u""}, Case{"[}", u""}, Case{"{]", u""}, Case{"ss", u""},
+        Case{"[", u""}, Case{"}", u""}, Case{"", u""}}) {
     SCOPED_TRACE(c.steps);
     Json::Writer writer(false);
     for (const char* step = c.steps; *step; ++step) {
@@ -180,6 +182,9 @@ TEST(JsonTest, WriterRefusesPiecesOutOfPlace) {
         break;
       case 's':
         writer.String(u"s");
+        break;
+      case 'm':
+        writer.Member(u"k", u"s");
         break;
       default:
         writer.Write(Value(1));
