@@ -215,7 +215,7 @@ template <class Writer>
 struct RepairsSurrogates<Writer, std::void_t<decltype(Writer::kRepairsSurrogates)>>
     : std::bool_constant<Writer::kRepairsSurrogates> {};
 
-// Writes a value tree through a RapidJSON writer without recursion. Every
+// Writes a value tree through a writer of either layout without recursion. Every
 // writer call is checked; the first failure ends the walk with false.
 template <class Writer> class TreeWriter {
 public:
@@ -541,7 +541,7 @@ inline void PutUnsafe(TextOutput& stream, char16_t c) { stream.PutUnsafe(c); }
 
 } // namespace detail
 
-// What Writer forwards to: a RapidJSON writer of either layout.
+// What Writer forwards to: the compact writer, or RapidJSON's indented one.
 struct Writer::Impl {
   using Buffer = detail::TextOutput;
   virtual ~Impl() = default;
