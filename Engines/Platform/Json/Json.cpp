@@ -1,5 +1,7 @@
 #include <Json/Json.h>
 
+#include <Internal/JsonText.h>
+
 namespace Json {
 namespace {
 // Number of RapidJSON internal checks that failed on this thread.
@@ -210,7 +212,13 @@ private:
   const char* m_error = nullptr;
 };
 
-// Writes a value tree through a RapidJSON writer without recursion. Every
+// True for a writer that repairs unpaired surrogates itself.
+template <class Writer, class = void> struct RepairsSurrogates : std::false_type {};
+template <class Writer>
+struct RepairsSurrogates<Writer, std::void_t<decltype(Writer::kRepairsSurrogates)>>
+    : std::bool_constant<Writer::kRepairsSurrogates> {};
+
+// Writes a value tree through a writer of either layout without recursion. Every
 // writer call is checked; the first failure ends the walk with false.
 template <class Writer> class TreeWriter {
 public:
@@ -262,11 +270,23 @@ public:
     }
   }
 
+  // A name and its string value.
+  bool WriteMember(std::u16string_view name, std::u16string_view text) {
+    if constexpr (RepairsSurrogates<Writer>::value) {
+      if (name.size() > std::numeric_limits<SizeType>::max() ||
+          text.size() > std::numeric_limits<SizeType>::max())
+        return false;
+      return m_writer.Member(name.data(), name.size(), text.data(), text.size());
+    } else {
+      return WriteText(name, true) && WriteText(text, false);
+    }
+  }
+
   bool WriteText(std::u16string_view text, bool isKey) {
     if (text.size() > std::numeric_limits<SizeType>::max())
       return false;
     const char16_t* data = text.data();
-    if (HasUnpairedSurrogate(text)) {
+    if (!RepairsSurrogates<Writer>::value && HasUnpairedSurrogate(text)) {
       ReplaceUnpairedSurrogates(text, m_scratch);
       data = m_scratch.data();
     }
@@ -634,62 +654,25 @@ void Document::Ref::AssignTo(Value& out) const {
   out = ToValue();
 }
 
-namespace {
+namespace detail {
 
-// RapidJSON's output stream into a buffer that grows geometrically and is
-// never cleared first (a string's resize would fill it with zeros); the
-// finished text is copied out once, at its exact length.
-class TextOutput {
-public:
-  using Ch = char16_t;
-  void Put(Ch c) {
-    if (m_size == m_capacity)
-      Grow(1);
-    m_units[m_size++] = c;
-  }
-  void PutUnsafe(Ch c) { m_units[m_size++] = c; }
-  void Reserve(std::size_t count) {
-    if (count > m_capacity - m_size)
-      Grow(count);
-  }
-  void Flush() {}
-  std::u16string Take() {
-    std::u16string text(m_units.get(), m_size);
-    m_units.reset();
-    m_size = m_capacity = 0;
-    return text;
-  }
-
-private:
-  void Grow(std::size_t count) {
-    const std::size_t capacity = std::max(m_capacity * 2, m_size + count + 1024);
-    std::unique_ptr<char16_t[]> units(new char16_t[capacity]);
-    std::copy(m_units.get(), m_units.get() + m_size, units.get());
-    m_units = std::move(units);
-    m_capacity = capacity;
-  }
-
-  std::unique_ptr<char16_t[]> m_units;
-  std::size_t m_size = 0;
-  std::size_t m_capacity = 0;
-};
-
-// Found by the writer through the stream's namespace: room for `count` units,
-// then units put without a check.
+// Found by the JSON library's writers through the stream's namespace: room
+// for `count` units, then units put without a check.
 inline void PutReserve(TextOutput& stream, std::size_t count) { stream.Reserve(count); }
 inline void PutUnsafe(TextOutput& stream, char16_t c) { stream.PutUnsafe(c); }
 
-} // namespace
+} // namespace detail
 
-// What Writer forwards to: a RapidJSON writer of either layout.
+// What Writer forwards to: the compact writer, or RapidJSON's indented one.
 struct Writer::Impl {
-  using Buffer = TextOutput;
+  using Buffer = detail::TextOutput;
   virtual ~Impl() = default;
   virtual bool StartObject() = 0;
   virtual bool EndObject() = 0;
   virtual bool StartArray() = 0;
   virtual bool EndArray() = 0;
   virtual bool Text(std::u16string_view text, bool isKey) = 0;
+  virtual bool Member(std::u16string_view name, std::u16string_view text) = 0;
   virtual bool Write(const Value& value) = 0;
   virtual bool IsComplete() const = 0;
 
@@ -702,7 +685,7 @@ namespace {
 
 template <class RapidWriter> struct WriterOf final : Writer::Impl {
   WriterOf() : writer(buffer), tree(writer) {
-    if constexpr (!std::is_same<RapidWriter, rapidjson::Writer<Buffer, Utf16, Utf16>>::value)
+    if constexpr (std::is_same<RapidWriter, rapidjson::PrettyWriter<Buffer, Utf16, Utf16>>::value)
       writer.SetIndent(' ', 2);
   }
   bool StartObject() override { return writer.StartObject(); }
@@ -710,6 +693,9 @@ template <class RapidWriter> struct WriterOf final : Writer::Impl {
   bool StartArray() override { return writer.StartArray(); }
   bool EndArray() override { return writer.EndArray(); }
   bool Text(std::u16string_view text, bool isKey) override { return tree.WriteText(text, isKey); }
+  bool Member(std::u16string_view name, std::u16string_view text) override {
+    return tree.WriteMember(name, text);
+  }
   bool Write(const Value& value) override { return tree.Write(value); }
   bool IsComplete() const override { return writer.IsComplete(); }
 
@@ -717,7 +703,7 @@ template <class RapidWriter> struct WriterOf final : Writer::Impl {
   TreeWriter<RapidWriter> tree;
 };
 
-using CompactWriter = WriterOf<rapidjson::Writer<Writer::Impl::Buffer, Utf16, Utf16>>;
+using CompactWriter = WriterOf<detail::CompactWriter>;
 using IndentedWriter = WriterOf<rapidjson::PrettyWriter<Writer::Impl::Buffer, Utf16, Utf16>>;
 
 } // namespace
@@ -743,6 +729,9 @@ bool Writer::Key(std::u16string_view name) {
 }
 bool Writer::String(std::u16string_view text) {
   return Check(!m_impl->failed && m_impl->Text(text, false));
+}
+bool Writer::Member(std::u16string_view name, std::u16string_view text) {
+  return Check(!m_impl->failed && m_impl->Member(name, text));
 }
 bool Writer::Write(const Value& value) { return Check(!m_impl->failed && m_impl->Write(value)); }
 

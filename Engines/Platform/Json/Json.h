@@ -371,6 +371,8 @@ public:
   bool Key(std::u16string_view name);
   /// A string value.
   bool String(std::u16string_view text);
+  /// A member whose value is a string: the text of Key(name) then String(text).
+  bool Member(std::u16string_view name, std::u16string_view text);
   /// A whole value, containers included, as ValueToString writes it.
   bool Write(const Value& value);
   /// Makes room for `units` more UTF-16 units of text: a hint, never needed.

@@ -1,12 +1,12 @@
 #include <ZelPref/ConversionPolicy.h>
 
 #include <algorithm>
+#include <cassert>
 #include <charconv>
 #include <climits>
 #include <cmath>
 #include <cstdint>
 #include <cstdlib>
-#include <cstring>
 #include <string>
 #include <string_view>
 #include <system_error>
@@ -113,9 +113,12 @@ char* ShortDecimal(double value, char* out) {
     return out;
   }
   const double scaled = value * 1000.0;
-  if (!(std::fabs(scaled) < 1e15) || std::nearbyint(scaled) != scaled)
+  if (!(std::fabs(scaled) < 1e15))
     return nullptr;
+  // Whole when the conversion, which drops any fraction, loses nothing.
   const long long thousandths = static_cast<long long>(scaled);
+  if (static_cast<double>(thousandths) != scaled)
+    return nullptr;
   // Exactly the double that the decimal reads back as: with at most fifteen
   // significant digits no shorter decimal reads back the same.
   if (static_cast<double>(thousandths) / 1000.0 != value)
@@ -128,42 +131,38 @@ char* ShortDecimal(double value, char* out) {
     magnitude /= 10;
     --decimals;
   }
-  // to_chars writes the exponent form when it is shorter than the fixed one.
-  unsigned long long significant = magnitude;
-  while (significant % 10 == 0)
-    significant /= 10;
   const int digits = DigitCount(magnitude);
-  const int significantDigits = DigitCount(significant);
-  const int fixedLength = decimals > 0 ? std::max(digits, decimals + 1) + 1 : digits;
-  const int exponent = digits - 1 - decimals;
-  const int exponentDigits = std::abs(exponent) >= 100 ? 3 : 2;
-  const int scientificLength =
-      significantDigits + (significantDigits > 1 ? 1 : 0) + 2 + exponentDigits;
-  if (fixedLength > scientificLength)
-    return nullptr;
+  // to_chars writes the exponent form when it is shorter than the fixed one,
+  // which only a whole number ending in zeros can be.
+  if (decimals == 0) {
+    unsigned long long significant = magnitude;
+    while (significant % 10 == 0)
+      significant /= 10;
+    const int significantDigits = DigitCount(significant);
+    const int exponentDigits = digits - 1 >= 100 ? 3 : 2;
+    if (digits > significantDigits + (significantDigits > 1 ? 1 : 0) + 2 + exponentDigits)
+      return nullptr;
+  }
   if (value < 0)
     *out++ = '-';
-  char digitsText[24];
-  const int written = static_cast<int>(
-      std::to_chars(digitsText, digitsText + sizeof digitsText, magnitude).ptr - digitsText);
-  if (decimals == 0) {
-    std::memcpy(out, digitsText, static_cast<std::size_t>(written));
-    return out + written;
-  }
-  const int wholeDigits = written - decimals;
-  if (wholeDigits <= 0) {
+  // The digits from the last, the point after the first `decimals` of them;
+  // a value below one starts with "0." and any zeros before its digits.
+  char* end = out + digits + (decimals > 0);
+  if (decimals > 0 && digits <= decimals) {
     *out++ = '0';
     *out++ = '.';
-    for (int i = wholeDigits; i < 0; ++i)
+    for (int i = digits; i < decimals; ++i)
       *out++ = '0';
-    std::memcpy(out, digitsText, static_cast<std::size_t>(written));
-    return out + written;
+    end = out + digits;
   }
-  std::memcpy(out, digitsText, static_cast<std::size_t>(wholeDigits));
-  out += wholeDigits;
-  *out++ = '.';
-  std::memcpy(out, digitsText + wholeDigits, static_cast<std::size_t>(decimals));
-  return out + decimals;
+  char* digit = end;
+  for (int k = 0; k < digits; ++k) {
+    if (k == decimals && k > 0)
+      *--digit = '.';
+    *--digit = static_cast<char>('0' + magnitude % 10);
+    magnitude /= 10;
+  }
+  return end;
 }
 
 } // namespace
@@ -176,13 +175,19 @@ ZelStringT<char16_t> NumberConversionPolicy::ToText(const ZelUtils::Any& value) 
   const double* number = value.GetIf<double>();
   if (!number || !std::isfinite(*number))
     Fail();
-  char buffer[64];
-  if (const char* end = ShortDecimal(*number, buffer))
-    return Widen(buffer, end);
-  const std::to_chars_result result = std::to_chars(buffer, buffer + sizeof buffer, *number);
-  if (result.ec != std::errc())
-    Fail();
-  return Widen(buffer, result.ptr);
+  char16_t text[kMaxTextLength];
+  return ZelStringT<char16_t>(text, static_cast<std::size_t>(WriteText(*number, text) - text));
+}
+
+char16_t* NumberConversionPolicy::WriteText(double number, char16_t* out) noexcept {
+  assert(std::isfinite(number));
+  char buffer[kMaxTextLength];
+  const char* end = ShortDecimal(number, buffer);
+  if (!end)
+    end = std::to_chars(buffer, buffer + sizeof buffer, number).ptr;
+  for (const char* c = buffer; c != end; ++c)
+    *out++ = static_cast<char16_t>(*c);
+  return out;
 }
 
 // The value of a short plain decimal ("-12.25"): its digits as a whole

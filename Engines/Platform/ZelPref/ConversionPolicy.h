@@ -8,6 +8,7 @@
 #include <ZelPlatform/ZelString.h>
 #include <ZelUtils/Any.h>
 
+#include <cstddef>
 #include <exception>
 
 namespace ZelPref {
@@ -48,10 +49,17 @@ protected:
 /// text form.
 class ZEL_API NumberConversionPolicy final : public ConversionPolicy {
 public:
+  /// Room enough for the text of any number.
+  static constexpr std::size_t kMaxTextLength = 32;
+
   NumberConversionPolicy() = default;
   ~NumberConversionPolicy() override;
   ZelStringT<char16_t> ToText(const ZelUtils::Any& value) const override;
   ZelUtils::Any FromText(const ZelStringT<char16_t>& text) const override;
+  /// Writes the text ToText gives for `number`, which must be finite, into
+  /// `out` (room for kMaxTextLength units) and returns the end of it, so that
+  /// a writer can take the text without a string being made.
+  static char16_t* WriteText(double number, char16_t* out) noexcept;
 };
 
 /// Values held as int. Reads any number form whose value is a whole number in

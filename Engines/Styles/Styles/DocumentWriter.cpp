@@ -73,7 +73,7 @@ void DocumentWriter::WriteText(const StyleSheet& sheet, ZelStringT<char16_t>& te
     writer.Key(k_strExternalID);
     writer.String(sheet.m_externalID.GetView());
   }
-  JsonValue scratch;
+  StyleJson::TextScratch scratch;
   for (const auto& [category, entries] : categories) {
     writer.Key(category.GetView());
     writer.StartObject();

@@ -19,9 +19,15 @@ void StyleCategory::RegisterProperty(const PropertyKey& key, BaseStyleProperty* 
     return;
   // Everything that allocates comes first, so that a failure changes nothing.
   m_propertyOrder.reserve(m_propertyOrder.size() + 1);
-  m_byKey.reserve(m_byKey.size() + 1);
+  const std::size_t count = m_properties.size() + 1;
+  std::vector<std::pair<PropertyKey, BaseStyleProperty*>> byKey;
+  if (count * 2 > m_byKey.size()) {
+    byKey.resize(std::max<std::size_t>(16, m_byKey.size() * 2));
+    for (const auto& [known, behaviour] : m_byKey)
+      if (behaviour)
+        PlaceByKey(byKey, known, behaviour);
+  }
   std::vector<std::pair<std::u16string_view, BaseStyleProperty*>> byName;
-  const std::size_t count = m_byKey.size() + 1;
   if (count * 2 > m_byName.size()) {
     byName.resize(std::max<std::size_t>(8, m_byName.size() * 2));
     for (const auto& [name, behaviour] : m_byName)
@@ -32,26 +38,43 @@ void StyleCategory::RegisterProperty(const PropertyKey& key, BaseStyleProperty* 
   // Nothing below throws.
   if (!byName.empty())
     m_byName.swap(byName);
+  if (!byKey.empty())
+    m_byKey.swap(byKey);
   PlaceByName(m_byName, key.GetView(), property);
+  // A null behaviour is found as no behaviour, so it needs no slot.
+  if (property)
+    PlaceByKey(m_byKey, key, property);
   m_propertyOrder.push_back(key);
-  const auto at = std::lower_bound(m_byKey.begin(), m_byKey.end(), key,
-                                   [](const auto& item, PropertyKey k) { return item.first < k; });
-  m_byKey.emplace(at, key, property);
+}
+
+namespace {
+
+// The first slot to try for `key` in a by-key table of `size` slots (a power
+// of two): keys are identities, whose low bits are alike, so mix them.
+std::size_t FirstSlot(const PropertyKey& key, std::size_t size) {
+  return static_cast<std::size_t>((key.getHash() * 0x9E3779B97F4A7C15ull) >> 32) & (size - 1);
+}
+
+} // namespace
+
+void StyleCategory::PlaceByKey(std::vector<std::pair<PropertyKey, BaseStyleProperty*>>& table,
+                               const PropertyKey& key, BaseStyleProperty* property) {
+  std::size_t slot = FirstSlot(key, table.size());
+  while (table[slot].second)
+    slot = (slot + 1) & (table.size() - 1);
+  table[slot] = {key, property};
 }
 
 BaseStyleProperty* StyleCategory::GetStyleProperty(const PropertyKey& key) const {
-  // A flat array keyed by identity: scanned while short, halved when long.
-  constexpr std::size_t kScanLimit = 16;
-  if (m_byKey.size() <= kScanLimit) {
-    for (const auto& entry : m_byKey)
-      if (entry.first == key)
-        return entry.second;
+  // An open-addressing table by key identity, half full at most.
+  if (m_byKey.empty())
     return nullptr;
+  for (std::size_t slot = FirstSlot(key, m_byKey.size());;
+       slot = (slot + 1) & (m_byKey.size() - 1)) {
+    const auto& entry = m_byKey[slot];
+    if (!entry.second || entry.first == key)
+      return entry.second;
   }
-  const auto at =
-      std::lower_bound(m_byKey.begin(), m_byKey.end(), key,
-                       [](const auto& entry, PropertyKey k) { return entry.first < k; });
-  return at != m_byKey.end() && at->first == key ? at->second : nullptr;
 }
 
 namespace {

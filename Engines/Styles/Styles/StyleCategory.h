@@ -63,6 +63,9 @@ public:
   }
 
 private:
+  // Puts `property` under `key` into a by-key table with a free slot.
+  static void PlaceByKey(std::vector<std::pair<PropertyKey, BaseStyleProperty*>>& table,
+                         const PropertyKey& key, BaseStyleProperty* property);
   // Puts `property` under `name` into a by-name table with a free slot.
   static void PlaceByName(std::vector<std::pair<std::u16string_view, BaseStyleProperty*>>& table,
                           std::u16string_view name, BaseStyleProperty* property);
@@ -72,8 +75,8 @@ private:
   std::vector<PropertyKey> m_propertyOrder;
   std::map<PropertyKey, BaseStyleProperty*> m_properties;
   bool m_flag;
-  // The same behaviours for fast lookups: by key identity, and by key text in
-  // a small open-addressing table (half full at most).
+  // The same behaviours for fast lookups, by key identity and by key text,
+  // each in a small open-addressing table (half full at most).
   std::vector<std::pair<PropertyKey, BaseStyleProperty*>> m_byKey;
   std::vector<std::pair<std::u16string_view, BaseStyleProperty*>> m_byName;
 };

@@ -10,9 +10,13 @@
 #include <Styles/Internal/JsonAccess.h>
 
 #include <Json/Json.h>
+#include <ZelPref/ConversionPolicy.h>
 
+#include <cmath>
+#include <cstdint>
 #include <memory>
 #include <optional>
+#include <typeinfo>
 #include <utility>
 #include <vector>
 
@@ -34,6 +38,10 @@ public:
   }
   Json::Value& Value() { return m_value = Json::Value(); }
   void Member(const ZelStringT<char16_t>& name) { m_object.AddValue(name, std::move(m_value)); }
+  bool Plain(const BaseStyleProperty&, const StyleSheet&, const ZelUtils::Any&,
+             const PropertyKey&) {
+    return false;
+  }
 
 private:
   Json::Object& m_object;
@@ -43,20 +51,45 @@ private:
 // The same members written straight into JSON text.
 class WriterSink {
 public:
-  WriterSink(Json::Writer& writer, Json::Value& scratch) : m_writer(writer), m_value(scratch) {}
-  void Text(std::u16string_view name, std::u16string_view text) {
-    m_writer.Key(name);
-    m_writer.String(text);
-  }
-  Json::Value& Value() { return m_value; }
+  WriterSink(Json::Writer& writer, detail::StyleJson::TextScratch& scratch)
+      : m_writer(writer), m_scratch(scratch) {}
+  void Text(std::u16string_view name, std::u16string_view text) { m_writer.Member(name, text); }
+  Json::Value& Value() { return m_scratch.value; }
   void Member(const ZelStringT<char16_t>& name) {
     m_writer.Key(name.GetView());
-    m_writer.Write(m_value);
+    m_writer.Write(m_scratch.value);
+  }
+  // A plain property with a stock text or number policy: the member its
+  // Serialize would give, written without making a string or a value. False
+  // when the general way must be taken (it also throws what Serialize throws).
+  bool Plain(const BaseStyleProperty& behaviour, const StyleSheet& sheet,
+             const ZelUtils::Any& value, const PropertyKey& name) {
+    using Kind = detail::StyleJson::TextScratch::Kind;
+    const Kind kind = m_scratch.KindOf(behaviour);
+    if (kind == Kind::kGeneral)
+      return false;
+    if (sheet.GetVersion() < behaviour.GetMinimumVersion())
+      return true;
+    if (kind == Kind::kText) {
+      const auto* text = value.GetIf<ZelStringT<char16_t>>();
+      if (!text)
+        return false;
+      m_writer.Member(name.GetView(), text->GetView());
+      return true;
+    }
+    const double* number = value.GetIf<double>();
+    if (!number || !std::isfinite(*number))
+      return false;
+    char16_t digits[ZelPref::NumberConversionPolicy::kMaxTextLength];
+    const char16_t* end = ZelPref::NumberConversionPolicy::WriteText(*number, digits);
+    m_writer.Member(name.GetView(),
+                    std::u16string_view(digits, static_cast<std::size_t>(end - digits)));
+    return true;
   }
 
 private:
   Json::Writer& m_writer;
-  Json::Value& m_value;
+  detail::StyleJson::TextScratch& m_scratch;
 };
 
 } // namespace
@@ -77,6 +110,8 @@ void StyleJson::WriteMembers(const Style& style, const StyleSheet& sheet, bool i
     const BaseStyleProperty* behaviour = style.FindBehaviour(entry.first);
     if (!behaviour || (!includeTemporary && behaviour->IsTemporary()))
       continue;
+    if (sink.Plain(*behaviour, sheet, entry.second, entry.first))
+      continue;
     if (behaviour->Serialize(sheet, &style, entry.second, sink.Value()))
       sink.Member(entry.first.GetString());
   }
@@ -90,8 +125,35 @@ void StyleJson::Write(const Style& style, const StyleSheet& sheet, JsonValue& ou
   WriteMembers(style, sheet, includeTemporary, sink);
 }
 
+StyleJson::TextScratch::Kind StyleJson::TextScratch::KindOf(const BaseStyleProperty& behaviour) {
+  // Addresses are multiples of the allocation alignment; mix the bits.
+  std::size_t slot = static_cast<std::size_t>(
+      (reinterpret_cast<std::uintptr_t>(&behaviour) >> 4) * 0x9E3779B97F4A7C15ull >> 58);
+  for (std::size_t probe = 0; probe < kSlots; ++probe, slot = (slot + 1) % kSlots) {
+    if (m_behaviours[slot] == &behaviour)
+      return m_kinds[slot];
+    if (!m_behaviours[slot])
+      break;
+  }
+  // Only an exact StyleProperty is known to write what its policy gives.
+  Kind kind = kGeneral;
+  if (typeid(behaviour) == typeid(StyleProperty)) {
+    if (const ZelPref::ConversionPolicy* policy = behaviour.GetConversionPolicy()) {
+      if (typeid(*policy) == typeid(ZelPref::TextConversionPolicy))
+        kind = kText;
+      else if (typeid(*policy) == typeid(ZelPref::NumberConversionPolicy))
+        kind = kNumber;
+    }
+  }
+  if (!m_behaviours[slot]) {
+    m_behaviours[slot] = &behaviour;
+    m_kinds[slot] = kind;
+  }
+  return kind;
+}
+
 void StyleJson::Write(const Style& style, const StyleSheet& sheet, Json::Writer& writer,
-                      bool includeTemporary, JsonValue& scratch) {
+                      bool includeTemporary, TextScratch& scratch) {
   writer.StartObject();
   WriterSink sink(writer, scratch);
   WriteMembers(style, sheet, includeTemporary, sink);

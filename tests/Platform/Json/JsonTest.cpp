@@ -126,6 +126,74 @@ TEST(JsonTest, WriterRepairsWhatJsonCannotHold) {
   }
 }
 
+// Compact strings unit for unit: every escape, repaired surrogates, and each
+// unit that needs care at every place of a run the writer copies in words.
+TEST(JsonTest, CompactStringsAreEscapedExactly) {
+  const char16_t mixed[] = {u'"',  u'\\', u'/',  0x7F,   0,      0x1F,   u'\b',  u'\t',
+                            u'\n', u'\f', u'\r', 0xD83D, 0xDE00, 0xDC00, 0xD800, u'x'};
+  EXPECT_EQ(Json::ValueToString(Text(mixed, 16), false),
+            u"\"\\\"\\\\/\x7f\\u0000\\u001F\\b\\t\\n\\f\\r\U0001F600\uFFFD\uFFFDx\"");
+  struct Case {
+    std::u16string unit, written;
+  };
+  for (const Case& c :
+       {Case{u"\"", u"\\\""}, Case{u"\\", u"\\\\"}, Case{u"\x1b", u"\\u001B"},
+        Case{std::u16string(1, 0xDBFF), u"\uFFFD"}, Case{u"\U0001F600", u"\U0001F600"}}) {
+    for (std::size_t at = 0; at < 8; ++at) {
+      const std::u16string before(at, u'a');
+      SCOPED_TRACE(Show(c.unit) + " at " + std::to_string(at));
+      EXPECT_EQ(Json::ValueToString(Text(before + c.unit + u"bcdefgh"), false),
+                u"\"" + before + c.written + u"bcdefgh\"");
+    }
+  }
+}
+
+// Pieces out of place lose the whole text, as an unfinished one does. Steps:
+// { } [ ] open and close, k a name, s a string, m both, n a number.
+TEST(JsonTest, WriterRefusesPiecesOutOfPlace) {
+  struct Case {
+    const char* steps;
+    const char16_t* text;
+  };
+  for (const Case& c :
+       {Case{"{kn}", u"{\"k\":1}"}, Case{"[sn[]{}]", u"[\"s\",1,[],{}]"},
+        Case{"{k{}k[]}", u"{\"k\":{},\"k\":[]}"}, Case{"{mkn}", u"{\"k\":\"s\",\"k\":1}"},
+        Case{"[m]", u"[\"k\",\"s\"]"}, Case{"{kmn}", u"{\"k\":\"k\",\"s\":1}"}, Case{"{n}", u""},
+        Case{"{k}", u""}, Case{"{k[}", u""}, Case{"[}", u""}, Case{"{]", u""}, Case{"ss", u""},
+        Case{"[", u""}, Case{"}", u""}, Case{"", u""}}) {
+    SCOPED_TRACE(c.steps);
+    Json::Writer writer(false);
+    for (const char* step = c.steps; *step; ++step) {
+      switch (*step) {
+      case '{':
+        writer.StartObject();
+        break;
+      case '}':
+        writer.EndObject();
+        break;
+      case '[':
+        writer.StartArray();
+        break;
+      case ']':
+        writer.EndArray();
+        break;
+      case 'k':
+        writer.Key(u"k");
+        break;
+      case 's':
+        writer.String(u"s");
+        break;
+      case 'm':
+        writer.Member(u"k", u"s");
+        break;
+      default:
+        writer.Write(Value(1));
+      }
+    }
+    EXPECT_EQ(writer.TakeText(), Text(c.text));
+  }
+}
+
 TEST(JsonTest, LayoutKeepsMemberOrderAndRepeatedNames) {
   const Text compact = u"{\"b\":[1,true,null],\"a\":\"\\u0001\\n\",\"b\":3}";
   const Value value = ParseOrFail(compact);

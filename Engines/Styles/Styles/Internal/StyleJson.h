@@ -5,11 +5,10 @@
 
 #include <Styles/Style.h>
 
-#include <string_view>
+#include <Json/Json.h>
 
-namespace Json {
-class Writer;
-} // namespace Json
+#include <cstddef>
+#include <string_view>
 
 namespace Styles {
 namespace detail {
@@ -25,9 +24,25 @@ public:
   // Fills `out` with the style's object as a value tree.
   static void Write(const Style& style, const StyleSheet& sheet, JsonValue& out,
                     bool includeTemporary);
-  // Writes the style's object as text; `scratch` is reused for the values.
+  // What writing a document's styles as text keeps from one style to the
+  // next: a value reused for members, and how each behaviour met is written,
+  // found once by its type (behaviours live unchanged through one export).
+  class TextScratch {
+  public:
+    enum Kind : unsigned char { kUnknown, kGeneral, kText, kNumber };
+    JsonValue value;
+    // How `behaviour` is written: by its Serialize, or as a plain text or
+    // number property of the stock policies.
+    Kind KindOf(const BaseStyleProperty& behaviour);
+
+  private:
+    static constexpr std::size_t kSlots = 64;
+    const BaseStyleProperty* m_behaviours[kSlots] = {};
+    Kind m_kinds[kSlots] = {};
+  };
+  // Writes the style's object as text.
   static void Write(const Style& style, const StyleSheet& sheet, Json::Writer& writer,
-                    bool includeTemporary, JsonValue& scratch);
+                    bool includeTemporary, TextScratch& scratch);
 
 private:
   // Hands the members of the style's object to `sink`, in their order.

@@ -1,0 +1,173 @@
+#include <Internal/JsonText.h>
+
+#include <algorithm>
+#include <cstdint>
+#include <cstring>
+
+namespace Json {
+namespace detail {
+
+std::u16string TextOutput::Take() {
+  std::u16string text(m_units.get(), m_size);
+  m_units.reset();
+  m_size = m_capacity = 0;
+  return text;
+}
+
+void TextOutput::Grow(std::size_t count) {
+  const std::size_t capacity = std::max(m_capacity * 2, m_size + count + 1024);
+  std::unique_ptr<Ch[]> units(new Ch[capacity]);
+  std::copy(m_units.get(), m_units.get() + m_size, units.get());
+  m_units = std::move(units);
+  m_capacity = capacity;
+}
+
+namespace {
+
+constexpr char16_t kHexDigits[] = u"0123456789ABCDEF";
+
+bool IsHighSurrogate(char16_t c) { return (c & 0xFC00) == 0xD800; }
+bool IsLowSurrogate(char16_t c) { return (c & 0xFC00) == 0xDC00; }
+
+// True when one of four units (in one word) may need more than a copy: a
+// control character, a quote, a backslash or a surrogate. A lane flags when
+// it is zero after the lane's test; a borrow only flags lanes above a true one.
+bool NeedsCare(std::uint64_t units) {
+  constexpr std::uint64_t kOnes = 0x0001000100010001ull;
+  constexpr std::uint64_t kHighs = 0x8000800080008000ull;
+  const auto hasZero = [](std::uint64_t x) { return (x - kOnes) & ~x & kHighs; };
+  const std::uint64_t control = (units - 0x20 * kOnes) & ~units & kHighs;
+  return (control | hasZero(units ^ (u'"' * kOnes)) | hasZero(units ^ (u'\\' * kOnes)) |
+          hasZero((units & (0xF800 * kOnes)) ^ (0xD800 * kOnes))) != 0;
+}
+
+// Writes the unit `c` that needs more than a copy (a control character, a
+// quote, a backslash or a surrogate); `next` is the unit after it, which a
+// paired surrogate takes too. Returns the end of what was written.
+char16_t* WriteSpecial(char16_t c, const char16_t*& next, const char16_t* end, char16_t* out) {
+  if (c >= 0xD800) {
+    if (IsHighSurrogate(c) && next != end && IsLowSurrogate(*next)) {
+      *out++ = c;
+      *out++ = *next++;
+    } else {
+      *out++ = u'\uFFFD';
+    }
+    return out;
+  }
+  *out++ = u'\\';
+  switch (c) {
+  case u'"':
+  case u'\\':
+    *out++ = c;
+    break;
+  case u'\b':
+    *out++ = u'b';
+    break;
+  case u'\t':
+    *out++ = u't';
+    break;
+  case u'\n':
+    *out++ = u'n';
+    break;
+  case u'\f':
+    *out++ = u'f';
+    break;
+  case u'\r':
+    *out++ = u'r';
+    break;
+  default:
+    *out++ = u'u';
+    *out++ = u'0';
+    *out++ = u'0';
+    *out++ = kHexDigits[c >> 4];
+    *out++ = kHexDigits[c & 0xF];
+  }
+  return out;
+}
+
+// Writes `text` quoted and escaped at `out` (room for 2 + 6 * length units)
+// and returns the end of it.
+char16_t* WriteQuoted(const char16_t* text, std::size_t length, char16_t* out) {
+  *out++ = u'"';
+  const char16_t* const end = text + length;
+  while (text != end) {
+    if (end - text >= 4) {
+      std::uint64_t units;
+      std::memcpy(&units, text, sizeof units);
+      if (!NeedsCare(units)) {
+        std::memcpy(out, &units, sizeof units);
+        text += 4;
+        out += 4;
+        continue;
+      }
+    }
+    const char16_t c = *text++;
+    if (c >= 0x20 && c != u'"' && c != u'\\' && (c & 0xF800) != 0xD800)
+      *out++ = c;
+    else
+      out = WriteSpecial(c, text, end, out);
+  }
+  *out++ = u'"';
+  return out;
+}
+
+} // namespace
+
+bool CompactWriter::String(const char16_t* text, std::size_t length) {
+  if (!Prefix(true))
+    return false;
+  // At most six units for each unit of the text, and the quotes.
+  m_out.Commit(WriteQuoted(text, length, m_out.Claim(2 + 6 * length)));
+  return true;
+}
+
+bool CompactWriter::Member(const char16_t* name, std::size_t nameLength, const char16_t* text,
+                           std::size_t textLength) {
+  if (m_levels.empty() || m_levels.back().inArray || m_levels.back().valueCount % 2 != 0)
+    return String(name, nameLength) && String(text, textLength);
+  Level& level = m_levels.back();
+  char16_t* out = m_out.Claim(6 + 6 * (nameLength + textLength));
+  if (level.valueCount > 0)
+    *out++ = u',';
+  level.valueCount += 2;
+  out = WriteQuoted(name, nameLength, out);
+  *out++ = u':';
+  m_out.Commit(WriteQuoted(text, textLength, out));
+  return true;
+}
+
+bool CompactWriter::Root() {
+  if (m_hasRoot)
+    return false;
+  m_hasRoot = true;
+  return true;
+}
+
+bool CompactWriter::Open(bool isArray, char16_t bracket) {
+  if (!Prefix(false))
+    return false;
+  m_levels.push_back(Level{0, isArray});
+  m_out.Put(bracket);
+  return true;
+}
+
+bool CompactWriter::Close(bool isArray, char16_t bracket) {
+  if (m_levels.empty() || m_levels.back().inArray != isArray ||
+      (!isArray && m_levels.back().valueCount % 2 != 0))
+    return false;
+  m_levels.pop_back();
+  m_out.Put(bracket);
+  return true;
+}
+
+bool CompactWriter::Raw(const char16_t* text, std::size_t length) {
+  if (!Prefix(false))
+    return false;
+  char16_t* out = m_out.Claim(length);
+  std::memcpy(out, text, length * sizeof(char16_t));
+  m_out.Commit(out + length);
+  return true;
+}
+
+} // namespace detail
+} // namespace Json

@@ -1,0 +1,107 @@
+// The output side of JSON text: a growing buffer of UTF-16 units and the
+// compact layout written straight into it. Json::Writer and ValueToString
+// write through these. Not installed: hosts never include it.
+#pragma once
+
+#include <cstddef>
+#include <memory>
+#include <string>
+#include <vector>
+
+namespace Json {
+namespace detail {
+
+// Text that grows geometrically and is never cleared first (a string's resize
+// would fill it with zeros); the finished text is copied out once, at its
+// exact length. Put/PutUnsafe/Reserve/Flush are what an output stream of the
+// JSON library offers; Claim and Commit let a writer store units directly.
+class TextOutput {
+public:
+  using Ch = char16_t;
+  void Put(Ch c) {
+    if (m_size == m_capacity)
+      Grow(1);
+    m_units[m_size++] = c;
+  }
+  void PutUnsafe(Ch c) { m_units[m_size++] = c; }
+  void Reserve(std::size_t count) {
+    if (count > m_capacity - m_size)
+      Grow(count);
+  }
+  void Flush() {}
+  // Room for `count` more units; the units written there count once Commit
+  // is given the end of what was written.
+  Ch* Claim(std::size_t count) {
+    Reserve(count);
+    return m_units.get() + m_size;
+  }
+  void Commit(const Ch* end) { m_size = static_cast<std::size_t>(end - m_units.get()); }
+  std::u16string Take();
+
+private:
+  void Grow(std::size_t count);
+
+  std::unique_ptr<Ch[]> m_units;
+  std::size_t m_size = 0;
+  std::size_t m_capacity = 0;
+};
+
+// The compact layout: exactly the text the JSON library's compact writer gives
+// for the same calls (the same escapes, commas and colons), with unpaired
+// surrogates written as U+FFFD in the same pass. A call out of place (a value
+// where a member name belongs, a second root, a close of the wrong kind)
+// returns false and writes nothing.
+class CompactWriter {
+public:
+  // Unpaired surrogates need no repair before String or Key.
+  static constexpr bool kRepairsSurrogates = true;
+
+  explicit CompactWriter(TextOutput& out) : m_out(out) {}
+
+  bool StartObject() { return Open(false, u'{'); }
+  bool StartArray() { return Open(true, u'['); }
+  bool EndObject() { return Close(false, u'}'); }
+  bool EndArray() { return Close(true, u']'); }
+  // A name is written as a string; so is a string where a name belongs.
+  bool Key(const char16_t* text, std::size_t length) { return String(text, length); }
+  bool String(const char16_t* text, std::size_t length);
+  // A name and its string value, as Key and then String write them.
+  bool Member(const char16_t* name, std::size_t nameLength, const char16_t* text,
+              std::size_t textLength);
+  bool Bool(bool flag) { return flag ? Raw(u"true", 4) : Raw(u"false", 5); }
+  bool Null() { return Raw(u"null", 4); }
+  // Text written as it is, such as a number's digits; the kind is not used.
+  bool RawValue(const char16_t* text, std::size_t length, int) { return Raw(text, length); }
+  bool IsComplete() const { return m_hasRoot && m_levels.empty(); }
+
+private:
+  struct Level {
+    std::size_t valueCount; // names and values written so far
+    bool inArray;
+  };
+
+  // The separator before a value; false when a value cannot go here.
+  bool Prefix(bool isString) {
+    if (m_levels.empty())
+      return Root();
+    Level& level = m_levels.back();
+    const bool isName = !level.inArray && level.valueCount % 2 == 0;
+    if (isName && !isString)
+      return false;
+    if (level.valueCount++ > 0)
+      m_out.Put(level.inArray || isName ? u',' : u':');
+    return true;
+  }
+  // The same for the value at the root: there is only one.
+  bool Root();
+  bool Open(bool isArray, char16_t bracket);
+  bool Close(bool isArray, char16_t bracket);
+  bool Raw(const char16_t* text, std::size_t length);
+
+  TextOutput& m_out;
+  std::vector<Level> m_levels;
+  bool m_hasRoot = false;
+};
+
+} // namespace detail
+} // namespace Json
