@@ -57,9 +57,9 @@ void SerializeComplete(const StyleSheet& sheet, const Style& style, Json::Value&
 }
 
 bool LosesContent(const Diagnostic& diagnostic) {
-  static const char* const kLosing[] = {"unknown-category", "unknown-property", "unknown-member",
-                                        "property-too-new", "value-replaced",   "number-rounded",
-                                        "name-taken",       "duplicate-member"};
+  static const char* const kLosing[] = {
+      "unknown-category", "unknown-property", "unknown-member", "property-too-new",
+      "value-replaced",   "number-rounded",   "name-taken",     "duplicate-member"};
   for (const char* code : kLosing)
     if (diagnostic.code == code)
       return true;
