@@ -21,6 +21,7 @@
 #include <cstdio>
 #include <map>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace {
@@ -115,12 +116,14 @@ void BM_ShowExplain(benchmark::State& state) {
   const Text text = MakeDocument(count);
   const Text last(ZelPlatform::Utf8ToUtf16("P" + std::to_string(count - count / 5 - 1)));
   for (auto _ : state) {
-    Json::Value value;
-    Text error;
-    Json::Parse(text, value, error);
-    Json::Object part = Styles::Tools::SelectStyles(value.Get<Json::Object>(), {last});
+    Text part, error;
+    {
+      Json::Document document;
+      document.ParseBorrowed(text, error);
+      part = Styles::Tools::SelectStylesText(document, {last});
+    }
     Styles::StyleSheet sheet;
-    if (!Styles::Tools::ImportChecked(sheet, part, true, nullptr))
+    if (!Styles::Tools::ImportChecked(sheet, std::move(part), true, nullptr))
       state.SkipWithError("the import should succeed");
     const Styles::Style* style = sheet.GetStyle(last);
     const auto values = Styles::Tools::ListEffectiveValues(*style);

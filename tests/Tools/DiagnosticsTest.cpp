@@ -277,6 +277,18 @@ TEST_F(DiagnosticsTest, ACheckedImportGivesWhatThePlainImportGives) {
     for (const Text& name : checked.GetStyleNames())
       kept[U8(name)] = checked.GetStyle(name);
 
+    Json::Value tree;
+    Text error;
+    if (Json::Parse(U16(document), tree, error) && tree.Is<Json::Object>()) {
+      std::vector<Diagnostic> fromText = ValidateDocument(U16(document));
+      for (Diagnostic& d : fromText)
+        d.line = d.column = 0;
+      const std::vector<Diagnostic> fromTree = ValidateDocument(tree.Get<Json::Object>());
+      ASSERT_EQ(fromText.size(), fromTree.size());
+      for (std::size_t i = 0; i < fromText.size(); ++i)
+        EXPECT_EQ(U8(fromText[i].pointer) + fromText[i].code + U8(fromText[i].message),
+                  U8(fromTree[i].pointer) + fromTree[i].code + U8(fromTree[i].message));
+    }
     if (!ImportChecked(checked, U16(document), replace, nullptr)) {
       ++refused;
       EXPECT_EQ(Exported(checked), before);
@@ -301,20 +313,27 @@ TEST_F(DiagnosticsTest, ACheckedImportGivesWhatThePlainImportGives) {
 }
 
 TEST_F(DiagnosticsTest, SelectingAStyleKeepsWhatItDependsOn) {
+  const Text text = U16(R"({"version": 1, "note": 2, "paragraph": {
+      "A": {"inherits": "b", "n": -1.5e-7, "f": [true, null, {"q": "\u00e9\""}]},
+      "B": {"character": {"inherits": "Em"}}, "Unrelated": {}},
+      "character": {"Em": {"inherits": "Base"}, "base": {}, "Other": {}},
+      "unknown": {"A": {}}, "id": "x"})");
   Json::Value value;
   Text error;
-  ASSERT_TRUE(Json::Parse(U16(R"({"version": 1, "paragraph": {
-      "A": {"inherits": "b"}, "B": {"character": {"inherits": "Em"}}, "Unrelated": {}},
-      "character": {"Em": {"inherits": "Base"}, "base": {}, "Other": {}},
-      "unknown": {"A": {}}})"),
-                          value, error));
+  ASSERT_TRUE(Json::Parse(text, value, error));
+  const std::string styles =
+      R"("paragraph":{"A":{"inherits":"b","n":-1.5e-07,"f":[true,null,{"q":"é\""}]},)"
+      R"("B":{"character":{"inherits":"Em"}}},"character":{"Em":{"inherits":"Base"},"base":{}})";
   const Json::Object part = SelectStyles(value.Get<Json::Object>(), {u"a"});
-  EXPECT_EQ(
-      U8(Json::ValueToString(Json::Value(part), false)),
-      R"({"version":1,"paragraph":{"A":{"inherits":"b"},"B":{"character":{"inherits":"Em"}}},)"
-      R"("character":{"Em":{"inherits":"Base"},"base":{}}})");
+  EXPECT_EQ(U8(Json::ValueToString(Json::Value(part), false)),
+            R"({"version":1,"note":2,)" + styles + R"(,"id":"x"})");
   // Moving the part out of the document gives the same part.
   EXPECT_EQ(SelectStyles(std::move(value.Get<Json::Object>()), {u"a"}), part);
+  // From a compact parse, as text, keeping of the sheet's members the
+  // version and the id only.
+  Json::Document document;
+  ASSERT_TRUE(document.ParseBorrowed(text, error));
+  EXPECT_EQ(U8(SelectStylesText(document, {u"a"})), R"({"version":1,)" + styles + R"(,"id":"x"})");
 }
 
 } // namespace

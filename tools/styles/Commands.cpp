@@ -26,11 +26,14 @@
 
 #include <algorithm>
 #include <filesystem>
+#include <functional>
 #include <iostream>
 #include <iterator>
 #include <memory>
 #include <optional>
+#include <string_view>
 #include <system_error>
+#include <utility>
 
 namespace StylesCommand {
 
@@ -62,10 +65,10 @@ bool IsStandardOutput(const std::string& path) {
 }
 
 // Reads a document's text; `diagnostics` gets an error for bytes that are not
-// UTF-8 (they are read as U+FFFD). With `keptBytes`, the bytes are kept there
-// too: half the size of the text, for a caller that lets the text go early.
+// UTF-8 (they are read as U+FFFD). With `digest`, a hash of the bytes goes
+// there, for a caller that lets the text go and may read it again.
 int ReadDocument(const std::string& path, Text& text, std::vector<Diagnostic>& diagnostics,
-                 std::string* keptBytes = nullptr) {
+                 std::size_t* digest = nullptr) {
   std::string bytes, reason;
   if (!ReadBytes(path, bytes, reason)) {
     Output::Error(DisplayName(path), "cannot be read: " + reason);
@@ -73,17 +76,16 @@ int ReadDocument(const std::string& path, Text& text, std::vector<Diagnostic>& d
   }
   if (std::optional<Diagnostic> invalid = FindInvalidUtf8(bytes))
     diagnostics.push_back(std::move(*invalid));
-  if (keptBytes)
-    *keptBytes = bytes;
+  if (digest)
+    *digest = std::hash<std::string_view>()(bytes);
   text = DecodeUtf8(std::move(bytes));
   return kSuccess;
 }
 
 // Whether LocateDiagnostics has a diagnostic to place.
 bool NeedsPositions(const std::vector<Diagnostic>& diagnostics) {
-  return std::any_of(diagnostics.begin(), diagnostics.end(), [](const Diagnostic& d) {
-    return d.line == 0 && !d.pointer.IsEmpty();
-  });
+  return std::any_of(diagnostics.begin(), diagnostics.end(),
+                     [](const Diagnostic& d) { return d.line == 0 && !d.pointer.IsEmpty(); });
 }
 
 // Whether a command goes on after reading a document into a sheet, given the
@@ -123,41 +125,36 @@ namespace {
 
 // Reads the JSON document `path` into `sheet` all or nothing; with `style`,
 // only what that style depends on, so that a large document answers for one
-// style at the cost of that style alone. Each form of the document is let go
-// once the next is made (text, tree, styles): the bytes, half the text, stay
-// to place diagnostics.
+// style at the cost of that style alone. The text is read in compact parses
+// (no value tree); for a style, the part it depends on is written out as a
+// text of its own. Each text is let go once read; the file is read again
+// only to place diagnostics, and only when it is unchanged.
 int LoadJson(const std::string& path, StyleSheet& sheet, Loss loss, const std::string* style) {
   Text text;
-  std::string bytes;
+  std::size_t digest = 0;
   std::vector<Diagnostic> diagnostics;
-  if (const int status = ReadDocument(path, text, diagnostics, &bytes))
+  if (const int status = ReadDocument(path, text, diagnostics, &digest))
     return status;
-  Json::Object document;
-  {
-    Json::Value value;
-    Text parseError;
-    if (!Json::Parse(text, value, parseError) || !value.Is<Json::Object>()) {
-      // The full check says where the text goes wrong.
-      const std::vector<Diagnostic> found = Styles::Tools::ValidateDocument(text);
-      diagnostics.insert(diagnostics.end(), found.begin(), found.end());
-      return Conclude(path, std::move(diagnostics), false, loss);
-    }
-    const Text released(std::move(text));
-    if (!style) {
-      document = std::move(value.Get<Json::Object>());
-    } else {
-      Json::Object selected =
-          Styles::Tools::SelectStyles(std::move(value.Get<Json::Object>()), {FromUtf8(*style)});
-      // Other members of the sheet belong to no style, and what they hold is
-      // no loss to the style's answer.
-      for (Json::Member& member : selected)
-        if (member.value.Is<Json::Object>() || member.name == u"version" || member.name == u"id")
-          document.AddValue(std::move(member.name), std::move(member.value));
-    }
-  }
   std::vector<Diagnostic> found;
-  const bool imported = Styles::Tools::ImportChecked(sheet, std::move(document), true, &found);
-  if (NeedsPositions(found))
+  if (style) {
+    Text part;
+    {
+      Json::Document document;
+      Text parseError;
+      if (!document.ParseBorrowed(text, parseError) || !document.GetRoot().IsObject()) {
+        // The full check says where the text goes wrong.
+        found = Styles::Tools::ValidateDocument(text);
+        diagnostics.insert(diagnostics.end(), found.begin(), found.end());
+        return Conclude(path, std::move(diagnostics), false, loss);
+      }
+      part = Styles::Tools::SelectStylesText(document, {FromUtf8(*style)});
+    }
+    std::swap(text, part); // the document's text goes with `part`
+  }
+  const bool imported = Styles::Tools::ImportChecked(sheet, std::move(text), true, &found);
+  std::string bytes, reason;
+  if (NeedsPositions(found) && ReadBytes(path, bytes, reason) &&
+      std::hash<std::string_view>()(bytes) == digest)
     Styles::Tools::LocateDiagnostics(DecodeUtf8(std::move(bytes)), found);
   diagnostics.insert(diagnostics.end(), found.begin(), found.end());
   return Conclude(path, std::move(diagnostics), imported, loss);
@@ -370,8 +367,7 @@ int Format(const CommonOptions&, const std::string& document, const FormatOption
                             "read; --in-place rewrites a document");
     return kUsage;
   }
-  if (const int status =
-          LoadSheet(document, sheet, format.lossy ? Loss::Accept : Loss::Refuse))
+  if (const int status = LoadSheet(document, sheet, format.lossy ? Loss::Accept : Loss::Refuse))
     return status;
   Json::Value value;
   Styles::Tools::ExportComplete(sheet, value);

@@ -1,7 +1,9 @@
 #include <StylesTools/Diagnostics.h>
 
 #include <Internal/MemberPositions.h>
+#include <Internal/ParsedDocument.h>
 #include <Internal/ToolsSupport.h>
+#include <Internal/TreeRef.h>
 
 #include <Styles/Internal/DocumentVersion.h>
 
@@ -15,10 +17,11 @@
 #include <ZelUtils/String.h>
 
 #include <algorithm>
+#include <cstdint>
 #include <cstdlib>
 #include <exception>
-#include <map>
 #include <memory>
+#include <optional>
 #include <string>
 #include <tuple>
 #include <unordered_map>
@@ -31,6 +34,7 @@ namespace Tools {
 using detail::AppendPointer;
 using detail::Quoted;
 using detail::Text;
+using detail::TreeRef;
 using detail::Widen;
 
 namespace {
@@ -42,7 +46,7 @@ constexpr char16_t kExternalName[] = u"original";
 constexpr std::size_t kNone = ~std::size_t(0);
 
 // The names whose unreadable values a plain import replaces instead of failing.
-bool IsRepairedName(const Text& name) {
+bool IsRepairedName(std::u16string_view name) {
   return name == u"xScale" || name == u"yScale" || name == u"angle" || name == u"skew";
 }
 
@@ -70,8 +74,9 @@ bool ParseErrorOffset(const Text& message, std::size_t& offset) {
 // level holds its token and the level above, on the stack of the walk.
 struct Where {
   const Where* up;
-  const Text* name; // the member's name, or null for an array index
+  std::u16string_view name;
   std::size_t index = 0;
+  bool isIndex = false; // an array index, not a member name
 
   Text Spell() const {
     std::vector<const Where*> levels;
@@ -79,26 +84,28 @@ struct Where {
       levels.push_back(level);
     Text pointer;
     for (auto level = levels.rbegin(); level != levels.rend(); ++level)
-      pointer = (*level)->name ? AppendPointer(pointer, (*level)->name->GetView())
-                               : AppendPointer(pointer, (*level)->index);
+      pointer = (*level)->isIndex ? AppendPointer(pointer, (*level)->index)
+                                  : AppendPointer(pointer, (*level)->name);
     return pointer;
   }
 };
 
-const Text kInheritsName(kInherits);
-
-class Validator {
+// Checks a document held as a tree (TreeRef) or a compact parse
+// (Json::Document::Ref). What it keeps per style is a few words, since a
+// document may hold a million styles.
+template <class Ref> class Validator {
 public:
   Validator(const StyleSheet* target, bool replace)
       : m_manager(GetStyleManager()), m_target(target), m_replace(replace) {}
 
-  std::vector<Diagnostic> Run(const Json::Object& document) {
+  std::vector<Diagnostic> Run(const Ref& document) {
     for (const char16_t* name : {kVersion, kExternalID})
       if (m_manager.CategoryExists(name))
         Add(Severity::Error, "reserved-name", Text(u"/") + name,
             u"the registered category " + Quoted(name) +
                 u" has the name of a document's own member; its styles cannot be written");
     CheckRepeatedNames(document, nullptr);
+    IndexStyles(document);
     CollectStyles(document);
     if (!m_understood && m_unknownSeen)
       Add(Severity::Error, "nothing-read", Text(),
@@ -110,35 +117,36 @@ public:
               u" is newer than the current version " + Widen(std::to_string(current)));
     for (m_current = 0; m_current < m_styles.size(); ++m_current) {
       const DocumentStyle& style = m_styles[m_current];
-      const Where category{nullptr, style.categoryName};
-      const Where where{&category, style.name};
-      CheckStyle(*style.object, style.category, where, style.node);
+      const Where category{nullptr, document.GetMemberName(style.category)};
+      const Where where{&category, NameOf(m_current)};
+      CheckStyle(StyleOf(m_current), m_categoryKeys[style.category], where, style.node);
     }
     FindCycles();
     return std::move(m_diagnostics);
   }
 
 private:
+  using Index = std::uint32_t;
+  static constexpr Index kNoNode = ~Index(0);
+  // A style member of a registered category: where it is in the document and
+  // the node its name stands for (that of the first style of the name).
   struct DocumentStyle {
-    const Text* categoryName;
-    const Text* name;
-    PropertyKey category;
-    const Json::Object* object;
-    std::size_t node;
+    Index category; // the category's member index in the document
+    Index member;   // the style's member index in its category
+    Index node;
   };
-  // A style an "inherits" can name: one of the document (first member of
-  // that name) or of the target. A target style's parent edge is resolved on
-  // demand.
+  // A style an "inherits" can name: node i below the number of document
+  // styles is that of m_styles[i]; those above are the target's, whose
+  // parent edges are resolved on demand.
   struct Node {
     PropertyKey category;
-    const Style* targetStyle = nullptr;
-    std::size_t parent = kNone;
-    bool parentKnown = false;
-    std::size_t edgeStyle = kNone; // the document style whose "inherits" made the edge
+    Index parent = kNoNode;
+    Index edgeStyle = kNoNode; // the document style whose "inherits" made the edge
   };
-  // Case-insensitive names of the document, viewing the parsed text.
-  using NameMap =
-      std::map<std::u16string_view, std::size_t, ZelUtils::String::LessThanCaseInsensitive>;
+  struct TargetNode {
+    const Style* style;
+    bool parentKnown;
+  };
 
   void Add(Severity severity, const char* code, const Text& pointer, const Text& message) {
     m_diagnostics.push_back(Diagnostic{severity, code, pointer, message, 0, 0});
@@ -147,57 +155,89 @@ private:
     Add(severity, code, where.Spell(), message);
   }
 
-  void CollectStyles(const Json::Object& document) {
+  std::u16string_view NameOf(std::size_t style) const {
+    return m_root->GetMember(m_styles[style].category).GetMemberName(m_styles[style].member);
+  }
+  Ref StyleOf(std::size_t style) const {
+    return m_root->GetMember(m_styles[style].category).GetMember(m_styles[style].member);
+  }
+  bool IsTargetNode(std::size_t node) const { return node >= m_styles.size(); }
+
+  // Lists every style member of a registered category and sorts them by name
+  // (letter case ignored): the first style of a name holds its node.
+  void IndexStyles(const Ref& document) {
+    m_root = document;
+    m_categoryKeys.resize(document.GetSize());
     for (std::size_t i = 0; i < document.GetSize(); ++i) {
-      const Text& name = document.GetValueName(i);
-      const Json::Value& value = document.GetValue(i);
-      const Where where{nullptr, &name};
-      const Json::Object* category = value.GetIf<Json::Object>();
-      if (!category) {
+      const Ref category = document.GetMember(i);
+      if (!category.IsObject() || !m_manager.CategoryExists(Text(document.GetMemberName(i))))
+        continue;
+      m_categoryKeys[i] = PropertyKey(Text(document.GetMemberName(i)));
+      for (std::size_t j = 0; j < category.GetSize(); ++j)
+        if (category.GetMember(j).IsObject())
+          m_styles.push_back(DocumentStyle{Index(i), Index(j), kNoNode});
+    }
+    m_byName.resize(m_styles.size());
+    for (std::size_t k = 0; k < m_byName.size(); ++k)
+      m_byName[k] = Index(k);
+    const ZelUtils::String::LessThanCaseInsensitive less;
+    std::stable_sort(m_byName.begin(), m_byName.end(),
+                     [&](Index a, Index b) { return less(NameOf(a), NameOf(b)); });
+    for (std::size_t k = 0; k < m_byName.size(); ++k) {
+      const bool sameName = k > 0 && !less(NameOf(m_byName[k - 1]), NameOf(m_byName[k]));
+      m_styles[m_byName[k]].node = sameName ? m_styles[m_byName[k - 1]].node : m_byName[k];
+    }
+    m_nodes.resize(m_styles.size());
+  }
+
+  void CollectStyles(const Ref& document) {
+    std::size_t style = 0; // the next of m_styles
+    for (std::size_t i = 0; i < document.GetSize(); ++i) {
+      const std::u16string_view name = document.GetMemberName(i);
+      const Ref value = document.GetMember(i);
+      const Where where{nullptr, name};
+      if (!value.IsObject()) {
         CheckSheetMember(name, value, where);
         continue;
       }
-      if (!m_manager.CategoryExists(name)) {
+      if (!m_manager.CategoryExists(Text(name))) {
         m_unknownSeen = true;
         Add(Severity::Warning, "unknown-category", where,
-            u"category " + Quoted(name) + u" is not registered; its styles are skipped");
+            u"category " + Quoted(Text(name)) + u" is not registered; its styles are skipped");
         continue;
       }
       m_understood = true;
-      const PropertyKey categoryKey(name);
+      const PropertyKey& categoryKey = m_categoryKeys[i];
       CheckReservedProperties(categoryKey, where);
-      m_styles.reserve(m_styles.size() + category->GetSize());
-      m_nodes.reserve(m_nodes.size() + category->GetSize());
-      for (std::size_t j = 0; j < category->GetSize(); ++j) {
-        const Text& styleName = category->GetValueName(j);
-        const Where styleWhere{&where, &styleName};
-        const Json::Object* object = category->GetValue(j).GetIf<Json::Object>();
-        if (!object) {
+      for (std::size_t j = 0; j < value.GetSize(); ++j) {
+        const std::u16string_view styleName = value.GetMemberName(j);
+        const Where styleWhere{&where, styleName};
+        if (!value.GetMember(j).IsObject()) {
           Add(Severity::Error, "style-not-object", styleWhere,
-              u"style " + Quoted(styleName) + u" must be an object");
+              u"style " + Quoted(Text(styleName)) + u" must be an object");
           continue;
         }
-        m_styles.push_back(DocumentStyle{&name, &styleName, categoryKey, object,
-                                         AddName(styleName, styleWhere, categoryKey)});
+        AddName(style++, styleWhere, categoryKey);
       }
     }
   }
 
   // Reports each name that `object` holds more than once; the reading keeps
   // only one of the values. Style names of a category are checked by AddName.
-  void CheckRepeatedNames(const Json::Object& object, const Where* where) {
+  void CheckRepeatedNames(const Ref& object, const Where* where) {
     const std::size_t size = object.GetSize();
     if (size < 2)
       return;
     const auto report = [&](std::size_t i) {
-      const Text& name = object.GetValueName(i);
-      Add(Severity::Error, "duplicate-member", Where{where, &name},
-          u"member " + Quoted(name) + u" appears more than once; only one of its values is read");
+      const std::u16string_view name = object.GetMemberName(i);
+      Add(Severity::Error, "duplicate-member", Where{where, name},
+          u"member " + Quoted(Text(name)) +
+              u" appears more than once; only one of its values is read");
     };
     if (size <= 16) { // most styles: no set to build
       for (std::size_t i = 1; i < size; ++i)
         for (std::size_t j = 0; j < i; ++j)
-          if (object.GetValueName(i) == object.GetValueName(j)) {
+          if (object.GetMemberName(i) == object.GetMemberName(j)) {
             report(i);
             break;
           }
@@ -205,7 +245,7 @@ private:
     }
     std::unordered_set<std::u16string_view> seen;
     for (std::size_t i = 0; i < size; ++i)
-      if (!seen.insert(object.GetValueName(i).GetView()).second)
+      if (!seen.insert(object.GetMemberName(i)).second)
         report(i);
   }
 
@@ -224,74 +264,78 @@ private:
     }
   }
 
-  void CheckSheetMember(const Text& name, const Json::Value& value, const Where& where) {
+  void CheckSheetMember(std::u16string_view name, const Ref& value, const Where& where) {
     if (name == kVersion) {
-      if (const double* number = value.GetIf<double>()) {
-        m_documentVersion = Styles::detail::TruncateVersion(*number);
+      if (value.IsNumber()) {
+        m_documentVersion = Styles::detail::TruncateVersion(value.GetNumber());
         m_versionSeen = true;
       } else {
         Add(Severity::Error, "wrong-kind", where, u"the version must be a number");
       }
     } else if (name == kExternalID) {
-      if (!value.Is<Text>())
+      if (!value.IsString())
         Add(Severity::Error, "wrong-kind", where, u"the sheet's id must be a string");
     } else {
       m_unknownSeen = true;
       Add(Severity::Warning, "unknown-member", where,
-          u"member " + Quoted(name) + u" is neither a category, the version nor the id");
+          u"member " + Quoted(Text(name)) + u" is neither a category, the version nor the id");
     }
   }
 
-  // The node of a document style name, reporting a name used twice.
-  std::size_t AddName(const Text& name, const Where& where, const PropertyKey& category) {
-    const auto [found, added] = m_documentNames.emplace(name.GetView(), m_nodes.size());
-    if (!added) {
-      const Text first(found->first);
+  // Gives the document style `style` its node's category, reporting a name
+  // used twice.
+  void AddName(std::size_t style, const Where& where, const PropertyKey& category) {
+    const std::size_t node = m_styles[style].node;
+    m_nodes[node].category = category; // the last reading wins
+    if (node != style) {
+      const Text first(NameOf(node)), name(NameOf(style));
       Add(Severity::Error, "duplicate-name", where,
           first == name
               ? u"style " + Quoted(name) + u" appears twice in the document"
               : u"style " + Quoted(name) + u" differs only in letter case from " + Quoted(first));
-      m_nodes[found->second].category = category; // the last reading wins
-      return found->second;
+      return;
     }
-    m_nodes.push_back(Node{category, nullptr, kNone, true, kNone});
-    if (m_target && !m_replace && m_target->GetStyle(name))
+    if (m_target && !m_replace && m_target->GetStyle(Text(NameOf(style))))
       Add(Severity::Warning, "name-taken", where,
-          u"the sheet already has a style " + Quoted(name) + u"; the document's is not imported");
-    return found->second;
+          u"the sheet already has a style " + Quoted(Text(NameOf(style))) +
+              u"; the document's is not imported");
   }
 
   // The style a parent name stands for, as the import resolves it.
   std::size_t Resolve(const Text& name) {
     const Style* targetStyle = m_target ? m_target->GetStyle(name) : nullptr;
-    const auto documentNode = m_documentNames.find(name.GetView());
-    if (documentNode != m_documentNames.end() && (!targetStyle || m_replace))
-      return documentNode->second;
+    const ZelUtils::String::LessThanCaseInsensitive less;
+    const auto documentStyle = std::lower_bound(
+        m_byName.begin(), m_byName.end(), name.GetView(),
+        [&](Index style, std::u16string_view key) { return less(NameOf(style), key); });
+    if (documentStyle != m_byName.end() && !less(name.GetView(), NameOf(*documentStyle)) &&
+        (!targetStyle || m_replace))
+      return m_styles[*documentStyle].node;
     if (!targetStyle)
       return kNone;
     const auto known = m_targetNodes.find(targetStyle);
     if (known != m_targetNodes.end())
       return known->second;
     const std::size_t node = m_nodes.size();
-    m_nodes.push_back(Node{targetStyle->GetCategoryName(), targetStyle, kNone, false, kNone});
+    m_nodes.push_back(Node{targetStyle->GetCategoryName(), kNoNode, kNoNode});
+    m_targets.push_back(TargetNode{targetStyle, false});
     m_targetNodes.emplace(targetStyle, node);
     return node;
   }
 
   std::size_t Parent(std::size_t node) {
-    if (!m_nodes[node].parentKnown) {
-      m_nodes[node].parentKnown = true;
+    TargetNode& target = m_targets[node - m_styles.size()];
+    if (!target.parentKnown) {
+      target.parentKnown = true;
       // A target style keeps a parent of the target; one replaced by the
       // document is followed by the document's style of that name.
-      const Style* parent = m_nodes[node].targetStyle->GetParent();
-      const Text parentName = m_target->GetStyleName(parent);
+      const Text parentName = m_target->GetStyleName(target.style->GetParent());
       const std::size_t parentNode = parentName.IsEmpty() ? kNone : Resolve(parentName);
-      m_nodes[node].parent = parentNode;
+      m_nodes[node].parent = parentNode == kNone ? kNoNode : Index(parentNode);
     }
-    return m_nodes[node].parent;
+    return m_nodes[node].parent == kNoNode ? kNone : m_nodes[node].parent;
   }
-
-  void CheckStyle(const Json::Object& object, const PropertyKey& categoryKey, const Where& where,
+  void CheckStyle(const Ref& object, const PropertyKey& categoryKey, const Where& where,
                   std::size_t node) {
     const std::shared_ptr<StyleCategory>* category = m_manager.FindCategory(categoryKey);
     if (!category) {
@@ -302,29 +346,29 @@ private:
     }
     CheckRepeatedNames(object, &where);
     for (std::size_t i = 0; i < object.GetSize(); ++i) {
-      const Text& name = object.GetValueName(i);
-      const Json::Value& value = object.GetValue(i);
-      const Where member{&where, &name};
+      const std::u16string_view name = object.GetMemberName(i);
+      const Ref value = object.GetMember(i);
+      const Where member{&where, name};
       if (name == kInherits) {
         CheckInherits(value, categoryKey, member, node);
       } else if (name == kExternalID || name == kExternalName) {
-        if (!value.Is<Text>())
-          Add(Severity::Error, "wrong-kind", member, Quoted(name) + u" must be a string");
+        if (!value.IsString())
+          Add(Severity::Error, "wrong-kind", member, Quoted(Text(name)) + u" must be a string");
       } else {
-        const std::optional<PropertyKey> key = PropertyKey::Find(name.GetView());
+        const std::optional<PropertyKey> key = PropertyKey::Find(name);
         const BaseStyleProperty* behaviour = key ? (*category)->GetStyleProperty(*key) : nullptr;
         if (!behaviour) {
           Add(Severity::Warning, "unknown-property", member,
-              u"property " + Quoted(name) + u" is not registered in category " +
+              u"property " + Quoted(Text(name)) + u" is not registered in category " +
                   Quoted(categoryKey.GetString()) + u"; it is skipped");
           continue;
         }
         if (behaviour->IsDeprecated())
           Add(Severity::Warning, "deprecated-property", member,
-              u"property " + Quoted(name) + u" is deprecated");
+              u"property " + Quoted(Text(name)) + u" is deprecated");
         if (behaviour->GetMinimumVersion() > m_documentVersion)
           Add(Severity::Warning, "property-too-new", member,
-              u"property " + Quoted(name) + u" needs version " +
+              u"property " + Quoted(Text(name)) + u" needs version " +
                   Widen(std::to_string(behaviour->GetMinimumVersion())) +
                   u", newer than the document's");
         CheckValue(*behaviour, name, value, member);
@@ -332,15 +376,16 @@ private:
     }
   }
 
-  void CheckInherits(const Json::Value& value, const PropertyKey& categoryKey, const Where& where,
+  void CheckInherits(const Ref& value, const PropertyKey& categoryKey, const Where& where,
                      std::size_t node) {
-    const Text* name = value.GetIf<Text>();
-    if (!name) {
+    if (!value.IsString()) {
       Add(Severity::Error, "wrong-kind", where, u"\"inherits\" must be a string");
       return;
     }
-    if (name->IsEmpty())
+    if (value.GetString().empty())
       return;
+    const Text written(value.GetString());
+    const Text* name = &written;
     const WImportStyleInfo& info = m_manager.GetImportStyleInfo();
     if (!info.names.empty() && info.names.count(*name))
       return; // the host asked for this name to be left alone
@@ -358,38 +403,37 @@ private:
               Quoted(m_nodes[parent].category.GetString()) + u", not " +
               Quoted(categoryKey.GetString()));
     if (node != kNone) {
-      m_nodes[node].parent = parent;
-      m_nodes[node].edgeStyle = m_current;
+      m_nodes[node].parent = Index(parent);
+      m_nodes[node].edgeStyle = Index(m_current);
     }
   }
 
-  void CheckValue(const BaseStyleProperty& behaviour, const Text& name, const Json::Value& value,
+  void CheckValue(const BaseStyleProperty& behaviour, std::u16string_view name, const Ref& value,
                   const Where& where) {
     if (dynamic_cast<const StyleSetProperty*>(&behaviour)) {
-      if (const Json::Object* object = value.GetIf<Json::Object>())
-        CheckStyle(*object, behaviour.GetElementCategoryName(), where, kNone);
+      if (value.IsObject())
+        CheckStyle(value, behaviour.GetElementCategoryName(), where, kNone);
       else if (!value.IsNull())
         Add(Severity::Error, "wrong-kind", where,
-            u"substyle " + Quoted(name) + u" must be an object or null");
+            u"substyle " + Quoted(Text(name)) + u" must be an object or null");
       return;
     }
     if (dynamic_cast<const StyleArrayProperty*>(&behaviour)) {
-      const Json::Array* array = value.GetIf<Json::Array>();
-      if (!array) {
+      if (!value.IsArray()) {
         Add(Severity::Error, "wrong-kind", where,
-            u"array " + Quoted(name) + u" must be an array of objects");
+            u"array " + Quoted(Text(name)) + u" must be an array of objects");
         return;
       }
       PropertyKey element = behaviour.GetElementCategoryName();
       if (element == PropertyKey::Empty)
         element = behaviour.GetCategoryKey();
-      for (std::size_t i = 0; i < array->GetSize(); ++i) {
-        const Where elementWhere{&where, nullptr, i};
-        if (const Json::Object* object = array->GetValue(i).GetIf<Json::Object>())
-          CheckStyle(*object, element, elementWhere, kNone);
+      for (std::size_t i = 0; i < value.GetSize(); ++i) {
+        const Where elementWhere{&where, std::u16string_view(), i, true};
+        if (value.GetElement(i).IsObject())
+          CheckStyle(value.GetElement(i), element, elementWhere, kNone);
         else
           Add(Severity::Error, "wrong-kind", elementWhere,
-              u"an element of " + Quoted(name) + u" must be an object");
+              u"an element of " + Quoted(Text(name)) + u" must be an object");
       }
       return;
     }
@@ -397,34 +441,35 @@ private:
     if (!policy)
       return; // nothing a host's own behaviour reads can be checked here
     Text text;
-    if (const Text* string = value.GetIf<Text>()) {
-      text = *string;
-    } else if (const double* number = value.GetIf<double>()) {
+    if (value.IsString()) {
+      text = Text(value.GetString());
+    } else if (value.IsNumber()) {
+      const double number = value.GetNumber();
       // The import reads numbers as "%g" text, which keeps six digits.
-      text = Text::FormatInternal("%g", *number);
+      text = Text::FormatInternal("%g", number);
       const std::string ascii(text.begin(), text.end());
-      if (std::strtod(ascii.c_str(), nullptr) != *number)
+      if (std::strtod(ascii.c_str(), nullptr) != number)
         Add(Severity::Warning, "number-rounded", where,
             u"the number is read as " + text + u"; write it as a string to keep every digit");
-    } else if (const bool* flag = value.GetIf<bool>()) {
-      text = *flag ? u"1" : u"0";
+    } else if (value.IsBool()) {
+      text = value.GetBool() ? u"1" : u"0";
     } else {
       Add(Severity::Error, "wrong-kind", where,
-          u"property " + Quoted(name) + u" must be a string, a number or true or false");
+          u"property " + Quoted(Text(name)) + u" must be a string, a number or true or false");
       return;
     }
     try {
       const ZelUtils::Any converted = policy->FromText(text);
       if (!behaviour.CheckType(converted))
         Add(Severity::Error, "type-rejected", where,
-            Quoted(text) + u" is not an allowed value of " + Quoted(name));
+            Quoted(text) + u" is not an allowed value of " + Quoted(Text(name)));
     } catch (const std::exception&) {
       if (IsRepairedName(name))
         Add(Severity::Warning, "value-replaced", where,
             Quoted(text) + u" cannot be read; the import stores the neutral value instead");
       else
         Add(Severity::Error, "bad-value", where,
-            Quoted(text) + u" cannot be read as a value of " + Quoted(name));
+            Quoted(text) + u" cannot be read as a value of " + Quoted(Text(name)));
     }
   }
 
@@ -440,13 +485,15 @@ private:
       while (node != kNone && state[node] == 0) {
         state[node] = 1;
         walk.push_back(node);
-        node = m_nodes[node].targetStyle ? Parent(node) : m_nodes[node].parent;
+        node = IsTargetNode(node)                ? Parent(node)
+               : m_nodes[node].parent == kNoNode ? kNone
+                                                 : m_nodes[node].parent;
         if (state.size() < m_nodes.size())
           state.resize(m_nodes.size(), 0);
       }
       if (node != kNone && state[node] == 1)
         for (auto it = std::find(walk.begin(), walk.end(), node); it != walk.end(); ++it)
-          if (m_nodes[*it].edgeStyle != kNone)
+          if (m_nodes[*it].edgeStyle != kNoNode)
             closing.push_back(m_nodes[*it].edgeStyle);
       for (const std::size_t visited : walk)
         state[visited] = 2;
@@ -454,9 +501,9 @@ private:
     // In document order, like the other diagnostics.
     std::sort(closing.begin(), closing.end());
     for (const std::size_t edge : closing) {
-      const Where category{nullptr, m_styles[edge].categoryName};
-      const Where style{&category, m_styles[edge].name};
-      Add(Severity::Error, "inheritance-cycle", Where{&style, &kInheritsName},
+      const Where category{nullptr, m_root->GetMemberName(m_styles[edge].category)};
+      const Where style{&category, NameOf(edge)};
+      Add(Severity::Error, "inheritance-cycle", Where{&style, kInherits},
           u"this parent would make the style inherit from itself; the import ignores it");
     }
   }
@@ -469,141 +516,55 @@ private:
   bool m_understood = false;  // some member is a registered category
   bool m_unknownSeen = false; // some member is an unknown category or member
   std::unordered_set<std::u16string_view> m_reservedChecked;
-  std::vector<DocumentStyle> m_styles;
-  std::size_t m_current = kNone; // the document style being checked
+  std::optional<Ref> m_root;
+  std::vector<PropertyKey> m_categoryKeys; // by member index, for registered categories
+  std::vector<DocumentStyle> m_styles;     // in document order
+  std::vector<Index> m_byName;             // m_styles sorted by name, letter case ignored
+  std::size_t m_current = kNone;           // the document style being checked
   std::vector<Node> m_nodes;
-  NameMap m_documentNames;
+  std::vector<TargetNode> m_targets; // of the nodes after the document's
   std::unordered_map<const Style*, std::size_t> m_targetNodes;
   std::vector<Diagnostic> m_diagnostics;
 };
 
-// Parses `text`; on failure `diagnostics` gets why and null is returned.
-Json::Object* ParseDocument(const Text& text, Json::Value& value,
-                            std::vector<Diagnostic>& diagnostics) {
-  Text errorText;
-  if (!Json::Parse(text, value, errorText)) {
-    Diagnostic diagnostic{Severity::Error, "invalid-json", Text(), u"not JSON: " + errorText, 0, 0};
-    std::size_t offset = 0;
-    if (ParseErrorOffset(errorText, offset))
-      std::tie(diagnostic.line, diagnostic.column) = detail::LinesAndColumns(text, {offset})[0];
-    diagnostics.push_back(std::move(diagnostic));
-    return nullptr;
-  }
-  Json::Object* document = value.GetIf<Json::Object>();
-  if (!document)
-    diagnostics.push_back(Diagnostic{Severity::Error, "not-an-object", Text(),
-                                     u"a sheet document is a JSON object", 0, 0});
-  return document;
+// The "invalid-json" diagnostic of a parse that failed with `errorText`.
+Diagnostic InvalidJson(const Text& text, const Text& errorText) {
+  Diagnostic diagnostic{Severity::Error, "invalid-json", Text(), u"not JSON: " + errorText, 0, 0};
+  std::size_t offset = 0;
+  if (ParseErrorOffset(errorText, offset))
+    std::tie(diagnostic.line, diagnostic.column) = detail::LinesAndColumns(text, {offset})[0];
+  return diagnostic;
 }
 
-// Marks the stand-ins of target styles in the scratch sheet. No document can
-// give a style this external name: JSON text cannot hold an unpaired surrogate.
-const Text& StandInMark() {
-  static const Text mark(std::u16string(1, char16_t(0xD800)) + u"stand-in");
-  return mark;
-}
-
-// ImportChecked on a parsed document; with `release`, the document is let go
-// as soon as the scratch sheet has read it, so that its tree is not held
-// beside both sheets while the new styles move into the target.
-bool ImportParsed(StyleSheet& target, Json::Object& document, bool replace,
-                  std::vector<Diagnostic>* diagnostics, bool release) {
-  std::vector<Diagnostic> found;
-  const auto finish = [&](bool imported) {
-    if (diagnostics)
-      *diagnostics = std::move(found);
-    return imported;
-  };
-  found = ValidateDocument(document, &target, replace);
-  if (HasErrors(found))
-    return finish(false);
-
-  // The scratch sheet starts as an image of the target: one empty stand-in
-  // per target style, under its name and category, linked as the originals.
-  StyleSheet scratch;
-  scratch.SetVersion(target.GetVersion());
-  scratch.SetExternalID(target.GetExternalID());
-  std::unordered_map<const Style*, Style*> standIns;
-  std::unordered_set<const Style*> standInSet;
-  for (const Text& name : target.GetStyleNames()) {
-    const Style* original = target.GetStyle(name);
-    Style* standIn =
-        new Style(nullptr, original ? original->GetCategoryName() : PropertyKey::Empty);
-    standIn->SetExternalName(StandInMark());
-    standIns.emplace(original, standIn);
-    standInSet.insert(standIn);
-    scratch.AddStyle(name, standIn, false);
-  }
-  for (const auto& [original, standIn] : standIns)
-    if (original && original->GetParent()) {
-      const auto parent = standIns.find(original->GetParent());
-      if (parent != standIns.end())
-        standIn->SetParent(parent->second);
-    }
-
-  try {
-    scratch.ImportJson(&document, replace);
-  } catch (const std::exception& error) {
-    found.push_back(Diagnostic{
-        Severity::Error, "behaviour-failed", Text(),
-        u"reading the document failed (" + Widen(error.what()) + u"); nothing was imported", 0, 0});
-    return finish(false);
-  } catch (...) {
-    found.push_back(Diagnostic{Severity::Error, "behaviour-failed", Text(),
-                               u"reading the document failed; nothing was imported", 0, 0});
-    return finish(false);
-  }
-  if (release)
-    document = Json::Object();
-
-  // Stand-ins still in the scratch sheet map back to their originals; the
-  // other styles are the import's. A replaced stand-in was destroyed, and its
-  // address may have been reused by a new style, hence the mark.
-  std::map<Style*, Style*> toOriginals;
-  std::vector<std::pair<Text, Style*>> created;
-  {
-    std::vector<Text> names = scratch.GetStyleNames();
-    const std::vector<Style*> styles = scratch.GetStyles(); // the same order
-    for (std::size_t i = 0; i < names.size(); ++i) {
-      Style* style = styles[i];
-      if (style && standInSet.count(style) && style->GetExternalName() == StandInMark())
-        toOriginals.emplace(style, target.GetStyle(names[i]));
-      else
-        created.emplace_back(std::move(names[i]), style);
-    }
-  }
-  for (auto& [name, style] : created) {
-    scratch.RemoveStyle(style);
-    if (style && !toOriginals.empty())
-      style->RemapDependency(toOriginals);
-  }
-
-  // Into the target, as the import's first pass would file them: a replaced
-  // style leaves, and every target style that referred to it refers to its
-  // successor.
-  std::map<Style*, Style*> successors;
-  for (auto& [name, style] : created) {
-    if (replace)
-      if (Style* previous = target.RemoveStyle(name))
-        successors.emplace(previous, style);
-    target.AddStyle(name, style, false);
-  }
-  if (!successors.empty()) {
-    std::unordered_set<const Style*> createdSet;
-    for (const auto& entry : created)
-      createdSet.insert(entry.second);
-    for (Style* style : target.GetStyles())
-      if (style && !createdSet.count(style))
-        style->RemapDependency(successors);
-    for (const auto& entry : successors)
-      delete entry.first;
-  }
-  target.SetVersion(scratch.GetVersion());
-  target.SetExternalID(scratch.GetExternalID());
-  return finish(true);
-}
+const Diagnostic kNotAnObject{
+    Severity::Error, "not-an-object", Text(), u"a sheet document is a JSON object", 0, 0};
 
 } // namespace
+
+namespace detail {
+
+// Parses `text` into `document`, whose strings stay in `text`; on failure
+// `diagnostics` gets why and false is returned.
+bool ParseDocument(const Text& text, Json::Document& document,
+                   std::vector<Diagnostic>& diagnostics) {
+  Text errorText;
+  if (!document.ParseBorrowed(text, errorText)) {
+    diagnostics.push_back(InvalidJson(text, errorText));
+    return false;
+  }
+  if (!document.GetRoot().IsObject()) {
+    diagnostics.push_back(kNotAnObject);
+    return false;
+  }
+  return true;
+}
+
+std::vector<Diagnostic> ValidateParsed(const Json::Document& document, const StyleSheet* target,
+                                       bool replace) {
+  return Validator<Json::Document::Ref>(target, replace).Run(document.GetRoot());
+}
+
+} // namespace detail
 
 bool HasErrors(const std::vector<Diagnostic>& diagnostics) {
   return std::any_of(diagnostics.begin(), diagnostics.end(),
@@ -612,46 +573,22 @@ bool HasErrors(const std::vector<Diagnostic>& diagnostics) {
 
 std::vector<Diagnostic> ValidateDocument(const Text& text) {
   std::vector<Diagnostic> diagnostics;
-  Json::Value value;
-  if (const Json::Object* document = ParseDocument(text, value, diagnostics)) {
-    diagnostics = ValidateDocument(*document);
-    detail::LocateMembers(text, diagnostics);
+  Json::Document document;
+  if (detail::ParseDocument(text, document, diagnostics)) {
+    diagnostics = detail::ValidateParsed(document, nullptr, false);
+    if (!diagnostics.empty())
+      detail::LocateMembers(text, diagnostics);
   }
   return diagnostics;
 }
 
 std::vector<Diagnostic> ValidateDocument(const Json::Object& document, const StyleSheet* target,
                                          bool replace) {
-  return Validator(target, replace).Run(document);
+  return Validator<TreeRef>(target, replace).Run(TreeRef(document));
 }
 
 void LocateDiagnostics(const Text& text, std::vector<Diagnostic>& diagnostics) {
   detail::LocateMembers(text, diagnostics);
-}
-
-bool ImportChecked(StyleSheet& target, const Text& text, bool replace,
-                   std::vector<Diagnostic>* diagnostics) {
-  std::vector<Diagnostic> found;
-  Json::Value value;
-  if (Json::Object* document = ParseDocument(text, value, found)) {
-    const bool imported = ImportChecked(target, std::move(*document), replace, diagnostics);
-    if (diagnostics)
-      detail::LocateMembers(text, *diagnostics);
-    return imported;
-  }
-  if (diagnostics)
-    *diagnostics = std::move(found);
-  return false;
-}
-
-bool ImportChecked(StyleSheet& target, Json::Object& document, bool replace,
-                   std::vector<Diagnostic>* diagnostics) {
-  return ImportParsed(target, document, replace, diagnostics, false);
-}
-
-bool ImportChecked(StyleSheet& target, Json::Object&& document, bool replace,
-                   std::vector<Diagnostic>* diagnostics) {
-  return ImportParsed(target, document, replace, diagnostics, true);
 }
 
 } // namespace Tools

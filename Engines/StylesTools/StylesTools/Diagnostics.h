@@ -13,6 +13,7 @@
 #include <vector>
 
 namespace Json {
+class Document;
 class Object;
 } // namespace Json
 
@@ -90,6 +91,11 @@ STYLES_TOOLS_API void LocateDiagnostics(const ZelStringT<char16_t>& text,
 /// (may be null) receives every diagnostic, warnings included.
 STYLES_TOOLS_API bool ImportChecked(StyleSheet& target, const ZelStringT<char16_t>& text,
                                     bool replace, std::vector<Diagnostic>* diagnostics);
+/// The same, letting go of `text` (left empty) as soon as the document has
+/// been read, before the new styles move into the target. The diagnostics
+/// get no positions for members: LocateDiagnostics gives them.
+STYLES_TOOLS_API bool ImportChecked(StyleSheet& target, ZelStringT<char16_t>&& text, bool replace,
+                                    std::vector<Diagnostic>* diagnostics);
 /// The same for a parsed document, which is not changed (StyleSheet::ImportJson
 /// takes it as non-const).
 STYLES_TOOLS_API bool ImportChecked(StyleSheet& target, Json::Object& document, bool replace,
@@ -113,6 +119,12 @@ STYLES_TOOLS_API Json::Object SelectStyles(const Json::Object& document,
 /// are freed as the part is taken, so that a large document is never held twice.
 STYLES_TOOLS_API Json::Object SelectStyles(Json::Object&& document,
                                            const std::vector<ZelStringT<char16_t>>& names);
+/// The part of the compact parse `document` that the styles called `names`
+/// depend on, as SelectStyles chooses it, written as compact JSON text; of
+/// the sheet's own members only "version" and "id" are kept, since no other
+/// bears on a style. Empty when the document is not an object.
+STYLES_TOOLS_API ZelStringT<char16_t>
+SelectStylesText(const Json::Document& document, const std::vector<ZelStringT<char16_t>>& names);
 
 } // namespace Tools
 } // namespace Styles

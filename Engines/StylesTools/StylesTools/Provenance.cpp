@@ -134,7 +134,7 @@ const StyleCategory* ElementCategory(const BaseStyleProperty& behaviour) {
 }
 
 void ListValues(const Style& anchor, std::vector<PropertyKey>& virtualKeys,
-                const StyleCategory* category, const Text& prefix, ResolutionCache& cache,
+                const StyleCategory* category, const Text& prefix, ResolutionCache* cache,
                 std::vector<EffectiveValue>& out) {
   if (!category)
     return;
@@ -143,9 +143,10 @@ void ListValues(const Style& anchor, std::vector<PropertyKey>& virtualKeys,
     if (!behaviour)
       continue;
     const Text path = prefix + key.GetString();
-    const Resolution resolution = virtualKeys.empty()
-                                      ? cache.Resolve(anchor, key)
-                                      : ResolveVirtual(anchor, virtualKeys, category, key, &cache);
+    const Resolution resolution = !virtualKeys.empty()
+                                      ? ResolveVirtual(anchor, virtualKeys, category, key, cache)
+                                  : cache ? cache->Resolve(anchor, key)
+                                          : ResolveProperty(anchor, key);
     if (behaviour->IsSubstyle()) {
       const Style* own = virtualKeys.empty() ? anchor.GetSubstyle(key, false) : nullptr;
       if (own) {
@@ -253,15 +254,19 @@ Resolution ResolvePathProperty(const Style& style, const PropertyPath& path) {
   return ResolveProperty(*reached, last);
 }
 
+// One style climbs each chain once per key without a cache: a cache would
+// remember every style of a long chain for an answer asked only once.
 std::vector<EffectiveValue> ListEffectiveValues(const Style& style) {
-  ResolutionCache cache;
-  return ListEffectiveValues(style, cache);
+  std::vector<EffectiveValue> values;
+  std::vector<PropertyKey> virtualKeys;
+  ListValues(style, virtualKeys, style.GetCategory().get(), Text(), nullptr, values);
+  return values;
 }
 
 std::vector<EffectiveValue> ListEffectiveValues(const Style& style, ResolutionCache& cache) {
   std::vector<EffectiveValue> values;
   std::vector<PropertyKey> virtualKeys;
-  ListValues(style, virtualKeys, style.GetCategory().get(), Text(), cache, values);
+  ListValues(style, virtualKeys, style.GetCategory().get(), Text(), &cache, values);
   return values;
 }
 
