@@ -108,7 +108,7 @@ const NodeStyle* Mirror(const Style* style, std::vector<std::unique_ptr<NodeStyl
   const NodeStyle* parent = Mirror(style->GetParent(), nodes);
   nodes.emplace_back(new NodeStyle);
   nodes.back()->parent = parent;
-  for (const Styles::PropertyMap::Entry& entry : style->GetProperties())
+  for (const Styles::PropertyMap::ConstEntry& entry : style->GetProperties())
     nodes.back()->values.emplace(entry.first, entry.second);
   return nodes.back().get();
 }

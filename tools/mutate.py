@@ -57,6 +57,16 @@ FAULTS = [
     ("revert-short-circuit", LIBRARY, "short circuit: reverting skips later single substyles",
      "removed = (*substyle)->RevertAllProperties() || removed;",
      "removed = removed || (*substyle)->RevertAllProperties();"),
+    # Property storage
+    ("map-insert-no-shift", LIBRARY, "missing step: an insert before other keys leaves their keys behind",
+     "    keys[j] = keys[j - 1];\n    values[j] = std::move(values[j - 1]);",
+     "    values[j] = std::move(values[j - 1]);"),
+    ("map-erase-leak", LIBRARY, "missing call: erasing the last value leaks what it holds",
+     "  values[count - 1].~Any();\n  --m_block->size;",
+     "  --m_block->size;"),
+    ("map-grow-drops-last", LIBRARY, "off by one: growing the block loses the last entry",
+     "  block->size = static_cast<std::uint32_t>(size());",
+     "  block->size = static_cast<std::uint32_t>(size() ? size() - 1 : 0);"),
     # Comparison
     ("order-size", LIBRARY, "wrong comparison: ordering by map size reversed",
      "return m_properties.size() < other.m_properties.size();",

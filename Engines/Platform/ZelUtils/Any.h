@@ -1,6 +1,6 @@
 /// @file
 /// ZelUtils::Any: the type-erased value of every style property. It holds one
-/// copyable value of any kind (or nothing), copies deeply, keeps small values
+/// copyable value of any kind (or nothing), copies deeply, keeps one-word values
 /// inline, and compares values: kinds are identified by their type name so a
 /// kind made in a host library and in the style library is the same kind.
 #pragma once
@@ -101,9 +101,10 @@ using StoredKind =
 /// One value of any copyable kind, or nothing (the empty value). Copies are
 /// deep; Get and GetIf reach the held value itself, never a copy.
 class Any {
-  // Room for a pointer triple or a standard string, so that text values live
-  // inline like numbers.
-  static constexpr std::size_t kInlineSize = 4 * sizeof(void*);
+  // Room for one word: numbers, flags, enumerations and pointers live inline;
+  // text and lists live behind a pointer, which keeps a stored value at 16
+  // bytes for the many numbers a sheet holds.
+  static constexpr std::size_t kInlineSize = sizeof(void*);
   static constexpr std::size_t kInlineAlign = alignof(double);
 
   template <class T>

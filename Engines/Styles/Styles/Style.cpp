@@ -28,7 +28,7 @@ namespace {
 std::vector<PropertyKey> OwnKeys(const PropertyMap& properties) {
   std::vector<PropertyKey> keys;
   keys.reserve(properties.size());
-  for (const PropertyMap::Entry& entry : properties)
+  for (const PropertyMap::ConstEntry& entry : properties)
     keys.push_back(entry.first);
   return keys;
 }
@@ -52,7 +52,7 @@ Style& Style::operator=(const Style& other) {
   if (&other == this)
     return *this;
   DestroyValuesAndTakeLinks(other);
-  for (const PropertyMap::Entry& entry : other.m_properties) {
+  for (const PropertyMap::ConstEntry& entry : other.m_properties) {
     BaseStyleProperty* behaviour = FindBehaviour(entry.first);
     if (!behaviour)
       continue;
@@ -83,7 +83,7 @@ void Style::DestroyValuesAndTakeLinks(const Style& source) {
 }
 
 void Style::DestroyOwnValues() noexcept {
-  for (PropertyMap::Entry& entry : m_properties) {
+  for (const PropertyMap::Entry& entry : m_properties) {
     BaseStyleProperty* behaviour = FindBehaviour(entry.first);
     try {
       if (behaviour)
@@ -119,7 +119,7 @@ void Style::SetCategory(const PropertyKey& name) {
   // Existing values are kept as they are, except substyles that no behaviour of
   // the new category could destroy: the behaviour that made them frees them now.
   for (std::size_t i = 0; m_category && i < m_properties.size();) {
-    PropertyMap::Entry& entry = m_properties[i];
+    const PropertyMap::Entry& entry = m_properties[i];
     BaseStyleProperty* behaviour = m_category->GetStyleProperty(entry.first);
     const BaseStyleProperty* next = category->GetStyleProperty(entry.first);
     const bool holdsSubstyles = entry.second.IsTypeCompatible<Style*>() ||
@@ -150,7 +150,7 @@ void Style::SetExternalField(ZelStringT<char16_t> ExternalNames::*field,
   // Ordinary styles pass the field on to their direct single substyles only.
   if (GetCategoryName() != StyleCategoryName)
     return;
-  for (const PropertyMap::Entry& entry : m_properties)
+  for (const PropertyMap::ConstEntry& entry : m_properties)
     if (Style* substyle = GetSubstyle(entry.first, false))
       set(*substyle);
 }
@@ -179,7 +179,7 @@ const ZelStringT<char16_t>& Style::GetExternalName() const noexcept {
 }
 
 void Style::RepairSubstyleOwnerPointers() {
-  for (PropertyMap::Entry& entry : m_properties)
+  for (const PropertyMap::Entry& entry : m_properties)
     if (BaseStyleProperty* behaviour = FindBehaviour(entry.first))
       behaviour->SetOwner(entry.second, this, entry.first);
 }
@@ -201,8 +201,8 @@ bool Style::operator==(const Style& other) const {
   if (m_properties.size() != other.m_properties.size())
     return false;
   for (std::size_t i = 0; i < m_properties.size(); ++i) {
-    const PropertyMap::Entry& mine = m_properties[i];
-    const PropertyMap::Entry& theirs = other.m_properties[i];
+    const PropertyMap::ConstEntry& mine = m_properties[i];
+    const PropertyMap::ConstEntry& theirs = other.m_properties[i];
     if (mine.first != theirs.first)
       return false;
     const BaseStyleProperty* behaviour = FindBehaviour(mine.first);
@@ -224,8 +224,8 @@ bool Style::operator<(const Style& other) const {
   if (m_properties.size() != other.m_properties.size())
     return m_properties.size() < other.m_properties.size();
   for (std::size_t i = 0; i < m_properties.size(); ++i) {
-    const PropertyMap::Entry& mine = m_properties[i];
-    const PropertyMap::Entry& theirs = other.m_properties[i];
+    const PropertyMap::ConstEntry& mine = m_properties[i];
+    const PropertyMap::ConstEntry& theirs = other.m_properties[i];
     if (mine.first != theirs.first)
       return mine.first < theirs.first;
     // A key without behaviour counts as equal here, unlike operator==.
@@ -255,6 +255,7 @@ bool Style::substyle_less_including_owner_based_inheritance(const Style& other) 
 // Lookup
 
 const ZelUtils::Any& Style::GetProperty(const PropertyKey& key) const {
+  __builtin_prefetch(m_parent); // overlaps the parent's load with the own search
   if (const ZelUtils::Any* own = m_properties.Find(key))
     return *own;
   return GetInheritedProperty(key);
@@ -264,6 +265,9 @@ const ZelUtils::Any& Style::GetInheritedProperty(const PropertyKey& key) const {
   const Style* current = this;
   for (;;) {
     while (const Style* parent = current->m_parent) {
+      // Fetch the next parent while this one's values arrive: the two loads
+      // then overlap instead of waiting for each other.
+      __builtin_prefetch(parent->m_parent);
       if (const ZelUtils::Any* own = parent->m_properties.Find(key))
         return *own;
       current = parent;
@@ -537,7 +541,7 @@ void Style::SetProperties(const std::vector<std::vector<PropertyKey>>& paths, co
 bool Style::RevertAllProperties() {
   bool removed = false;
   for (std::size_t i = 0; i < m_properties.size();) {
-    PropertyMap::Entry& entry = m_properties[i];
+    const PropertyMap::Entry& entry = m_properties[i];
     if (Style* const* substyle = entry.second.GetIf<Style*>(); substyle && *substyle) {
       // Single substyles stay, emptied in turn.
       removed = (*substyle)->RevertAllProperties() || removed;
@@ -564,7 +568,7 @@ bool Style::SubstylesHaveAnyParentalRelationships() const {
     found = substyle && (substyle->m_parent || substyle->SubstylesHaveAnyParentalRelationships());
     return !found;
   };
-  for (const PropertyMap::Entry& entry : m_properties) {
+  for (const PropertyMap::ConstEntry& entry : m_properties) {
     if (const BaseStyleProperty* behaviour = FindBehaviour(entry.first))
       behaviour->ProcessStylesInProperty(entry.second, visit);
     if (found)
@@ -578,7 +582,7 @@ bool Style::IsEmptyWithEmptySubstyles() const {
   const StyleVisitor visit = [](Style* substyle) {
     return !substyle || substyle->IsEmptyWithEmptySubstyles();
   };
-  for (const PropertyMap::Entry& entry : m_properties) {
+  for (const PropertyMap::ConstEntry& entry : m_properties) {
     const BaseStyleProperty* behaviour = FindBehaviour(entry.first);
     if (!behaviour || !behaviour->ProcessStylesInProperty(entry.second, visit))
       return false;
@@ -606,7 +610,7 @@ ZelStringT<char16_t> Style::GetCategoryUIName() const {
 
 unsigned Style::GetNumSubstyles() const {
   unsigned count = 0;
-  for (const PropertyMap::Entry& entry : m_properties)
+  for (const PropertyMap::ConstEntry& entry : m_properties)
     if (const BaseStyleProperty* behaviour = FindBehaviour(entry.first))
       count += behaviour->IsSubstyle() ? 1 : 0;
   return count;

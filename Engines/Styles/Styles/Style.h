@@ -13,11 +13,14 @@
 #include <ZelUtils/StringPool.h>
 
 #include <cstddef>
+#include <cstdint>
 #include <functional>
+#include <iterator>
 #include <map>
 #include <memory>
 #include <set>
 #include <string_view>
+#include <type_traits>
 #include <utility>
 #include <vector>
 
@@ -57,50 +60,133 @@ using PropertyVisitor =
 /// Visitor of styles; false stops.
 using StyleVisitor = ZelUtils::PortableVersion::Delegate<bool(Style*)>;
 
-/// The own values of a style: a flat array sorted by key identity, searched
-/// linearly while small and by bisection when large. Iteration is in key order.
+/// The own values of a style, sorted by key identity, in one block: the keys
+/// side by side (so that a lookup scans 8 bytes a key), then the values.
+/// Searched linearly while small and by bisection when large. Iteration is in
+/// key order and yields (key, value) pairs of references.
 class STYLES_API PropertyMap {
 public:
-  /// A key and its value.
-  using Entry = std::pair<PropertyKey, ZelUtils::Any>;
+  /// A key and its value, both referring into the map; valid until the map
+  /// changes. A mutable entry converts to a read-only one.
+  template <class Value> struct BasicEntry {
+    const PropertyKey& first; ///< the key
+    Value& second;            ///< its value
+    /// A read-only view of a mutable entry.
+    template <class Other, class = std::enable_if_t<std::is_convertible<Other&, Value&>::value>>
+    BasicEntry(const BasicEntry<Other>& other) noexcept
+        : first(other.first), second(other.second) {}
+    /// The entry of `key` and `value`, both kept by reference.
+    BasicEntry(const PropertyKey& key, Value& value) noexcept : first(key), second(value) {}
+  };
   ///@{
 
-  /// Iterator over the entries, in key order.
-  using const_iterator = std::vector<Entry>::const_iterator;
-  using iterator = std::vector<Entry>::iterator;
+  /// An entry whose value may be changed, and a read-only one.
+  using Entry = BasicEntry<ZelUtils::Any>;
+  using ConstEntry = BasicEntry<const ZelUtils::Any>;
   ///@}
+
+  /// Iterator over the entries, in key order; dereferencing yields an entry
+  /// by value.
+  template <class Value> class BasicIterator {
+  public:
+    ///@{
+
+    /// The standard iterator traits.
+    using iterator_category = std::forward_iterator_tag;
+    using value_type = BasicEntry<Value>;
+    using difference_type = std::ptrdiff_t;
+    using pointer = void;
+    using reference = BasicEntry<Value>;
+    ///@}
+
+    /// The position of `key` and `value`, which are parallel.
+    BasicIterator(const PropertyKey* key, Value* value) noexcept : m_key(key), m_value(value) {}
+    /// The entry at this position.
+    BasicEntry<Value> operator*() const noexcept { return {*m_key, *m_value}; }
+    ///@{
+
+    /// Steps to the next entry.
+    BasicIterator& operator++() noexcept {
+      ++m_key;
+      ++m_value;
+      return *this;
+    }
+    BasicIterator operator++(int) noexcept {
+      BasicIterator before = *this;
+      ++*this;
+      return before;
+    }
+    ///@}
+    ///@{
+
+    /// Same position.
+    friend bool operator==(const BasicIterator& a, const BasicIterator& b) noexcept {
+      return a.m_key == b.m_key;
+    }
+    friend bool operator!=(const BasicIterator& a, const BasicIterator& b) noexcept {
+      return a.m_key != b.m_key;
+    }
+    ///@}
+
+  private:
+    const PropertyKey* m_key;
+    Value* m_value;
+  };
+  ///@{
+
+  /// Iterator types over the entries.
+  using iterator = BasicIterator<ZelUtils::Any>;
+  using const_iterator = BasicIterator<const ZelUtils::Any>;
+  ///@}
+
+  /// An empty map; it allocates on its first insert.
+  PropertyMap() noexcept = default;
+  /// Takes the other map's entries, leaving it empty.
+  PropertyMap(PropertyMap&& other) noexcept : m_block(other.m_block) { other.m_block = nullptr; }
+  /// Destroys the own entries and takes the other map's, leaving it empty.
+  PropertyMap& operator=(PropertyMap&& other) noexcept {
+    PropertyMap taken(std::move(other));
+    Swap(taken);
+    return *this;
+  }
+  ///@{
+
+  /// Not copyable: a style copies values through their behaviours.
+  PropertyMap(const PropertyMap&) = delete;
+  PropertyMap& operator=(const PropertyMap&) = delete;
+  ///@}
+  /// Destroys the values (releasing nothing they own, as Clear).
+  ~PropertyMap();
 
   ///@{
 
   /// The entries in key order.
-  const_iterator begin() const noexcept { return m_entries.begin(); }
-  const_iterator end() const noexcept { return m_entries.end(); }
-  iterator begin() noexcept { return m_entries.begin(); }
-  iterator end() noexcept { return m_entries.end(); }
+  const_iterator begin() const noexcept { return {Keys(), Values()}; }
+  const_iterator end() const noexcept { return {Keys() + size(), Values() + size()}; }
+  iterator begin() noexcept { return {Keys(), Values()}; }
+  iterator end() noexcept { return {Keys() + size(), Values() + size()}; }
   ///@}
 
   ///@{
 
   /// The number of entries.
-  std::size_t size() const noexcept { return m_entries.size(); }
-  bool empty() const noexcept { return m_entries.empty(); }
+  std::size_t size() const noexcept { return m_block ? m_block->size : 0; }
+  bool empty() const noexcept { return size() == 0; }
   ///@}
 
   ///@{
 
   /// Entry i in key order; i must be below size().
-  const Entry& operator[](std::size_t i) const noexcept { return m_entries[i]; }
-  Entry& operator[](std::size_t i) noexcept { return m_entries[i]; }
+  ConstEntry operator[](std::size_t i) const noexcept { return {Keys()[i], Values()[i]}; }
+  Entry operator[](std::size_t i) noexcept { return {Keys()[i], Values()[i]}; }
   ///@}
 
   ///@{
 
   /// The value stored under `key`, or null.
   const ZelUtils::Any* Find(const PropertyKey& key) const noexcept {
-    if (m_entries.empty() || m_entries.back().first < key)
-      return nullptr; // beyond the last key, as a value being appended is
     const std::size_t i = LowerBound(key);
-    return i < m_entries.size() && m_entries[i].first == key ? &m_entries[i].second : nullptr;
+    return i < size() && Keys()[i] == key ? Values() + i : nullptr;
   }
   ZelUtils::Any* Find(const PropertyKey& key) noexcept {
     return const_cast<ZelUtils::Any*>(static_cast<const PropertyMap*>(this)->Find(key));
@@ -115,27 +201,47 @@ public:
   bool Erase(const PropertyKey& key);
   /// Removes every entry. Like Erase, it releases nothing a value owns: a
   /// style releases its substyles through their behaviours first.
-  void Clear() noexcept { m_entries.clear(); }
-  /// Makes room for `count` entries in all: a hint, never needed.
-  void Reserve(std::size_t count) { m_entries.reserve(count); }
+  void Clear() noexcept;
+  /// Makes room for `count` entries in all: a hint, never needed. The room
+  /// is exact, so a document's values take no more than they need.
+  void Reserve(std::size_t count);
   /// Exchanges the entries of the two maps without copying a value.
-  void Swap(PropertyMap& other) noexcept { m_entries.swap(other.m_entries); }
+  void Swap(PropertyMap& other) noexcept { std::swap(m_block, other.m_block); }
 
 private:
+  // The block's head; `capacity` keys follow it, then `capacity` values.
+  struct Block {
+    std::uint32_t size;
+    std::uint32_t capacity;
+  };
+  static_assert(sizeof(Block) % alignof(PropertyKey) == 0 &&
+                    sizeof(PropertyKey) % alignof(ZelUtils::Any) == 0,
+                "keys follow the head and values follow the keys unpadded");
+
+  PropertyKey* Keys() const noexcept {
+    return m_block ? reinterpret_cast<PropertyKey*>(m_block + 1) : nullptr;
+  }
+  ZelUtils::Any* Values() const noexcept {
+    return m_block ? reinterpret_cast<ZelUtils::Any*>(Keys() + m_block->capacity) : nullptr;
+  }
+  // Moves the entries into a new block with room for `capacity`.
+  void Reallocate(std::size_t capacity);
+
   // Index of the first entry whose key is not less than `key`.
   std::size_t LowerBound(const PropertyKey& key) const noexcept {
     constexpr std::size_t kLinearLimit = 16;
-    const std::size_t count = m_entries.size();
+    const std::size_t count = size();
+    const PropertyKey* keys = Keys();
     if (count <= kLinearLimit) {
       std::size_t i = 0;
-      while (i < count && m_entries[i].first < key)
+      while (i < count && keys[i] < key)
         ++i;
       return i;
     }
     std::size_t first = 0, length = count;
     while (length > 0) {
       const std::size_t half = length / 2;
-      if (m_entries[first + half].first < key) {
+      if (keys[first + half] < key) {
         first += half + 1;
         length -= half + 1;
       } else {
@@ -145,7 +251,7 @@ private:
     return first;
   }
 
-  std::vector<Entry> m_entries;
+  Block* m_block = nullptr;
 };
 
 /// A set of property values of one category, with a parent to inherit from

@@ -200,7 +200,7 @@ void Style::CopySubstyleProperties(const Style* source, const PropertyKey& key) 
 // Dependencies
 
 bool Style::ValuesDepend(StyleSpan styles, bool parentOnly) const {
-  for (const PropertyMap::Entry& entry : m_properties)
+  for (const PropertyMap::ConstEntry& entry : m_properties)
     if (const BaseStyleProperty* behaviour = FindBehaviour(entry.first))
       if (behaviour->HasDependency(entry.second, styles, parentOnly))
         return true;
@@ -253,7 +253,7 @@ std::vector<Style*> Style::GetDependencies(StyleSpan styles, bool parentOnly) co
 
 void Style::AppendValueDependencies(StyleSpan styles, bool parentOnly,
                                     std::vector<Style*>& out) const {
-  for (const PropertyMap::Entry& entry : m_properties) {
+  for (const PropertyMap::ConstEntry& entry : m_properties) {
     if (const BaseStyleProperty* behaviour = FindBehaviour(entry.first)) {
       const std::vector<Style*> held = behaviour->GetDependencies(entry.second, styles, parentOnly);
       out.insert(out.end(), held.begin(), held.end());
@@ -292,7 +292,7 @@ bool Style::HasParentalDependency(StyleSpan styles) const {
 bool Style::HasParentalDependency() const {
   if (m_parent || (m_owner && m_owner->m_parent))
     return true;
-  for (const PropertyMap::Entry& entry : m_properties)
+  for (const PropertyMap::ConstEntry& entry : m_properties)
     if (const BaseStyleProperty* behaviour = FindBehaviour(entry.first))
       if (behaviour->HasParentalDependency(entry.second))
         return true;

@@ -106,7 +106,7 @@ void StyleJson::WriteMembers(const Style& style, const StyleSheet& sheet, bool i
     sink.Text(k_strExternalID, style.GetExternalID().GetView());
   if (!style.GetExternalName().IsEmpty())
     sink.Text(k_strExternalName, style.GetExternalName().GetView());
-  for (const PropertyMap::Entry& entry : style.GetProperties()) {
+  for (const PropertyMap::ConstEntry& entry : style.GetProperties()) {
     const BaseStyleProperty* behaviour = style.FindBehaviour(entry.first);
     if (!behaviour || (!includeTemporary && behaviour->IsTemporary()))
       continue;

@@ -202,7 +202,7 @@ std::set<PropertyKey> GetStyleCategoryProperties(const Style& style) {
 
 std::set<PropertyKey> GetOverriddenProperties(const Style& style) {
   std::set<PropertyKey> keys;
-  for (const PropertyMap::Entry& entry : style.GetProperties())
+  for (const PropertyMap::ConstEntry& entry : style.GetProperties())
     keys.insert(keys.end(), entry.first);
   return keys;
 }
@@ -215,7 +215,7 @@ std::vector<PropertyPath> GetOverriddenPropertyPaths(const Style& style) {
 
 void GetOverriddenPropertyPaths(const Style& style, const PropertyPath& prefix,
                                 std::vector<PropertyPath>& paths) {
-  for (const PropertyMap::Entry& entry : style.GetProperties()) {
+  for (const PropertyMap::ConstEntry& entry : style.GetProperties()) {
     if (!HoldsSubstyleKind(entry.second)) {
       paths.push_back(MakePath(prefix, entry.first));
       continue;
@@ -231,7 +231,7 @@ GetOverriddenSubstyleProperties(const Style& style, const PropertyKey& setKey, b
   const Style* substyle = style.GetSubstyle(setKey, false);
   if (!substyle)
     return paths;
-  for (const PropertyMap::Entry& entry : substyle->GetProperties())
+  for (const PropertyMap::ConstEntry& entry : substyle->GetProperties())
     paths.push_back(includeSetKey ? MakePath(setKey, entry.first) : MakePath(entry.first));
   return paths;
 }
@@ -339,7 +339,7 @@ void ClearMatchingInheritedProperties(Style& style) {
   Style original(std::move(style));
   style.ClearAllProperties();
   const StyleCategory* category = style.GetCategory().get();
-  for (const PropertyMap::Entry& entry : original.GetProperties()) {
+  for (const PropertyMap::ConstEntry& entry : original.GetProperties()) {
     const BaseStyleProperty* behaviour =
         category ? category->GetStyleProperty(entry.first) : nullptr;
     if (behaviour && !behaviour->IsEqual(entry.second, style.GetProperty(entry.first)))
@@ -367,7 +367,7 @@ bool ForEachSubStyle(Style* style, const std::function<bool(Style*)>& fn, bool i
 
 void ClearEmptySubstyles(Style& style) {
   std::vector<PropertyKey> emptied;
-  for (const PropertyMap::Entry& entry : style.GetProperties()) {
+  for (const PropertyMap::ConstEntry& entry : style.GetProperties()) {
     if (!HoldsSubstyleKind(entry.second))
       continue;
     Style* substyle = HeldSubstyle(entry.second);
@@ -394,7 +394,7 @@ void CopySourceSubstylesThatExistsInDestinationStyle(Style* destination, const S
     }
     Style* destinationSubstyle = destination->GetSubstyle(key, false);
     assert(destinationSubstyle && "merging needs a substyle in the destination");
-    for (const PropertyMap::Entry& entry : sourceSubstyle->GetProperties())
+    for (const PropertyMap::ConstEntry& entry : sourceSubstyle->GetProperties())
       destinationSubstyle->SetProperty(entry.first, entry.second);
   }
 }

@@ -38,7 +38,7 @@ void DropSubstyleCycles(const std::vector<Style*>& roots) {
       const Style* holder = pending.back();
       pending.pop_back();
       const StyleCategory* category = holder->GetCategory().get();
-      for (const PropertyMap::Entry& entry : holder->GetProperties())
+      for (const PropertyMap::ConstEntry& entry : holder->GetProperties())
         if (const BaseStyleProperty* behaviour =
                 category ? category->GetStyleProperty(entry.first) : nullptr)
           behaviour->ProcessStylesInProperty(entry.second, [&](Style* substyle) {
