@@ -284,6 +284,19 @@ std::string FormatAscii(const char* format, ...) {
 
 } // namespace detail
 
+std::size_t FindInvalidUtf8(std::string_view text) {
+  const auto* bytes = reinterpret_cast<const uint8_t*>(text.data());
+  const auto length = static_cast<int64_t>(text.size());
+  for (int64_t i = 0; i < length;) {
+    const int64_t start = i;
+    UChar32 c;
+    U8_NEXT(bytes, i, length, c);
+    if (c < 0)
+      return static_cast<std::size_t>(start);
+  }
+  return std::string_view::npos;
+}
+
 std::u16string Utf8ToUtf16(std::string_view text) {
   std::u16string result;
   result.reserve(text.size());

@@ -21,6 +21,10 @@ namespace ZelPlatform {
 ZEL_API std::u16string Utf8ToUtf16(std::string_view text);
 /// UTF-16 to UTF-8; unpaired surrogates become U+FFFD.
 ZEL_API std::string Utf16ToUtf8(std::u16string_view text);
+/// The offset of the first byte of `text` that does not start a well-formed
+/// UTF-8 character (overlong forms, surrogates and values above U+10FFFF are
+/// ill-formed), or npos when the whole text is UTF-8.
+ZEL_API std::size_t FindInvalidUtf8(std::string_view text);
 
 namespace detail {
 // Full Unicode case-folded comparison (ASCII fast path); <0, 0 or >0. An

@@ -33,48 +33,13 @@ Problem MakeProblem(const std::string& part, const std::string& element,
   return Problem{Widen(part), Widen(element), Widen(message)};
 }
 
-// The offset of the first byte of `text` that is not part of a well-formed
-// UTF-8 character, or npos; overlong forms, surrogates and values above
-// U+10FFFF are not UTF-8.
-std::size_t FindInvalidUtf8(std::string_view text) {
-  for (std::size_t i = 0; i < text.size();) {
-    const auto at = [&](std::size_t k) { return static_cast<unsigned char>(text[k]); };
-    const unsigned char lead = at(i);
-    std::size_t length = 1;
-    unsigned char low = 0x80, high = 0xBF; // bounds of the second byte
-    if (lead < 0x80) {
-      ++i;
-      continue;
-    } else if (lead >= 0xC2 && lead <= 0xDF) {
-      length = 2;
-    } else if (lead >= 0xE0 && lead <= 0xEF) {
-      length = 3;
-      low = lead == 0xE0 ? 0xA0 : 0x80;
-      high = lead == 0xED ? 0x9F : 0xBF;
-    } else if (lead >= 0xF0 && lead <= 0xF4) {
-      length = 4;
-      low = lead == 0xF0 ? 0x90 : 0x80;
-      high = lead == 0xF4 ? 0x8F : 0xBF;
-    } else {
-      return i;
-    }
-    if (i + length > text.size() || at(i + 1) < low || at(i + 1) > high)
-      return i;
-    for (std::size_t k = 2; k < length; ++k)
-      if (at(i + k) < 0x80 || at(i + k) > 0xBF)
-        return i;
-    i += length;
-  }
-  return std::string_view::npos;
-}
-
 // Parses XML text, refusing any DOCTYPE: no DTD or entity is ever processed.
 bool ParseXml(std::string_view text, pugi::xml_document& document, std::string& message) {
   // Text without a UTF-16 or UTF-32 byte order mark must be UTF-8: names that
   // differ only in broken bytes would otherwise become one name when written.
   const bool wide = text.substr(0, 2) == "\xFF\xFE" || text.substr(0, 2) == "\xFE\xFF" ||
                     text.substr(0, 4) == std::string_view("\0\0\xFE\xFF", 4);
-  if (const std::size_t bad = wide ? std::string_view::npos : FindInvalidUtf8(text);
+  if (const std::size_t bad = wide ? std::string_view::npos : ZelPlatform::FindInvalidUtf8(text);
       bad != std::string_view::npos) {
     message = "is not well-formed XML (a byte that is not UTF-8 at byte " + std::to_string(bad) +
               ")";
