@@ -18,32 +18,7 @@
 #include <new>
 #include <string>
 
-// Every allocation of the process goes through these, so that the bytes in
-// use can be read before and after the import.
-namespace {
-std::atomic<std::size_t> g_bytesInUse{0};
-
-void* Allocate(std::size_t size) {
-  void* memory = std::malloc(size ? size : 1);
-  if (!memory)
-    throw std::bad_alloc();
-  g_bytesInUse += malloc_usable_size(memory);
-  return memory;
-}
-void Release(void* memory) noexcept {
-  if (memory) {
-    g_bytesInUse -= malloc_usable_size(memory);
-    std::free(memory);
-  }
-}
-} // namespace
-
-void* operator new(std::size_t size) { return Allocate(size); }
-void* operator new[](std::size_t size) { return Allocate(size); }
-void operator delete(void* memory) noexcept { Release(memory); }
-void operator delete[](void* memory) noexcept { Release(memory); }
-void operator delete(void* memory, std::size_t) noexcept { Release(memory); }
-void operator delete[](void* memory, std::size_t) noexcept { Release(memory); }
+#include "CountingAllocator.h"
 
 int main(int argc, char** argv) {
   if (argc != 2) {
