@@ -67,6 +67,11 @@ FAULTS = [
     ("map-grow-drops-last", LIBRARY, "off by one: growing the block loses the last entry",
      "  block->size = static_cast<std::uint32_t>(size());",
      "  block->size = static_cast<std::uint32_t>(size() ? size() - 1 : 0);"),
+    ("map-mask-erase", LIBRARY, "missing step: erasing forgets the other keys' lookup bits",
+     "  for (std::size_t j = 0; j + 1 < count; ++j)\n    m_keyMask |= MaskBit(keys[j]);",
+     ""),
+    ("map-mask-move", LIBRARY, "missing copy: a moved map loses its lookup bits",
+     "m_keyMask(other.m_keyMask)", "m_keyMask(0)"),
     # Comparison
     ("order-size", LIBRARY, "wrong comparison: ordering by map size reversed",
      "return m_properties.size() < other.m_properties.size();",

@@ -39,6 +39,11 @@ TEST(PropertyMapTest, KeepsKeyOrderThroughInsertsAndErases) {
       EXPECT_EQ(entry.second.Get<Text>(), entry.first.GetString());
     }
     EXPECT_EQ(left, kept);
+    PropertyMap moved(std::move(map)); // a lookup must find exactly the kept keys
+    for (const PropertyKey& key : sorted)
+      EXPECT_EQ(moved.Find(key) != nullptr,
+                std::find(kept.begin(), kept.end(), key) != kept.end());
+    EXPECT_EQ(map.Find(kept[0]), nullptr);
   }
 }
 

@@ -28,6 +28,7 @@ void PropertyMap::Clear() noexcept {
   for (std::size_t i = 0; i < m_block->size; ++i)
     values[i].~Any();
   m_block->size = 0;
+  m_keyMask = 0;
 }
 
 void PropertyMap::Reallocate(std::size_t capacity) {
@@ -74,6 +75,7 @@ bool PropertyMap::Insert(const PropertyKey& key, ZelUtils::Any&& value) {
   keys[i] = key;
   values[i] = std::move(value);
   ++m_block->size;
+  m_keyMask |= MaskBit(key);
   return true;
 }
 
@@ -90,6 +92,10 @@ bool PropertyMap::Erase(const PropertyKey& key) {
   }
   values[count - 1].~Any();
   --m_block->size;
+  // Other keys may share the erased key's bit.
+  m_keyMask = 0;
+  for (std::size_t j = 0; j + 1 < count; ++j)
+    m_keyMask |= MaskBit(keys[j]);
   return true;
 }
 
