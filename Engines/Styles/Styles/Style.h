@@ -234,11 +234,11 @@ private:
   ZelUtils::Any* Values() const noexcept {
     return m_block ? reinterpret_cast<ZelUtils::Any*>(Keys() + m_block->capacity) : nullptr;
   }
-  // The key's bit in the mask, from its pooled entry's address: entries
-  // are at least 16 bytes apart, so the bits above the fourth vary.
+  // The key's bit in the mask: the pool keeps its entries side by side, so
+  // keys pooled one after another, as a category's are, get distinct bits.
   static std::uint64_t MaskBit(const PropertyKey& key) noexcept {
-    const std::size_t hash = key.getHash();
-    return std::uint64_t(1) << (((hash >> 4) ^ (hash >> 10)) & 63);
+    const std::size_t slot = key.getHash() / sizeof(ZelStringT<char16_t>);
+    return std::uint64_t(1) << (slot & 63);
   }
   // Moves the entries into a new block with room for `capacity`.
   void Reallocate(std::size_t capacity);
