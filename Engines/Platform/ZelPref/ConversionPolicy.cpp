@@ -195,8 +195,8 @@ char16_t* NumberConversionPolicy::WriteText(double number, char16_t* out) noexce
 // one rounding of the division gives the correctly rounded value. False for
 // any other form, which the general reader takes.
 bool ReadShortDecimal(std::u16string_view text, double& value) {
-  constexpr double kPowers[] = {1e0, 1e1, 1e2,  1e3,  1e4,  1e5,  1e6,  1e7,
-                                1e8, 1e9, 1e10, 1e11, 1e12, 1e13, 1e14, 1e15};
+  static constexpr double kPowers[] = {1e0, 1e1, 1e2,  1e3,  1e4,  1e5,  1e6,  1e7,
+                                       1e8, 1e9, 1e10, 1e11, 1e12, 1e13, 1e14, 1e15};
   std::size_t i = 0;
   const bool negative = !text.empty() && text[0] == u'-';
   i += negative;
