@@ -161,7 +161,7 @@ void DocumentReader::Import(StyleSheet& sheet, const typename Access::Object& do
     DropSubstyleCycles(roots);
   };
   try {
-    JsonValue scratch;
+    StyleJson::ReadScratch scratch;
     std::size_t next = 0;
     forEachMember([&](const PropertyKey& categoryKey, const typename Access::Object& category) {
       for (std::size_t j = 0; j < Access::Size(category); ++j) {

@@ -160,9 +160,63 @@ void StyleJson::Write(const Style& style, const StyleSheet& sheet, Json::Writer&
   writer.EndObject();
 }
 
+StyleJson::ReadScratch::Kind StyleJson::ReadScratch::KindOf(const BaseStyleProperty& behaviour) {
+  // Addresses are multiples of the allocation alignment; mix the bits.
+  std::size_t slot = static_cast<std::size_t>(
+      (reinterpret_cast<std::uintptr_t>(&behaviour) >> 4) * 0x9E3779B97F4A7C15ull >> 58);
+  for (std::size_t probe = 0; probe < kSlots; ++probe, slot = (slot + 1) % kSlots) {
+    if (m_behaviours[slot] == &behaviour)
+      return m_kinds[slot];
+    if (!m_behaviours[slot])
+      break;
+  }
+  Kind kind = kGeneral;
+  if (typeid(behaviour) == typeid(StyleProperty)) {
+    if (const ZelPref::ConversionPolicy* policy = behaviour.GetConversionPolicy()) {
+      if (typeid(*policy) == typeid(ZelPref::TextConversionPolicy))
+        kind = kText;
+      else if (typeid(*policy) == typeid(ZelPref::NumberConversionPolicy))
+        kind = kNumber;
+    }
+  }
+  if (!m_behaviours[slot]) {
+    m_behaviours[slot] = &behaviour;
+    m_kinds[slot] = kind;
+  }
+  return kind;
+}
+
+namespace {
+
+// Reads the string value of a plain property of the kind given (kText or
+// kNumber) as its Deserialize would: its values own nothing and need no
+// adjustment. False when the general way must be taken: for other kinds, and
+// for a number the policy rejects.
+bool ReadPlain(StyleJson::ReadScratch::Kind kind, const BaseStyleProperty& behaviour,
+               PropertyMap& properties, std::u16string_view text) {
+  ZelUtils::Any value;
+  if (kind == StyleJson::ReadScratch::kText) {
+    value = ZelUtils::Any(ZelStringT<char16_t>(text));
+  } else if (kind == StyleJson::ReadScratch::kNumber) {
+    try {
+      value = behaviour.GetConversionPolicy()->FromText(ZelStringT<char16_t>(text));
+    } catch (const ZelPref::Detail::BadConversion&) {
+      return false;
+    }
+  } else {
+    return false;
+  }
+  // A repeated member replaces the value read before it.
+  if (!properties.Insert(behaviour.GetName(), std::move(value)))
+    *properties.Find(behaviour.GetName()) = std::move(value);
+  return true;
+}
+
+} // namespace
+
 template <class Access>
 void StyleJson::Read(Style& style, const StyleSheet& sheet, const typename Access::Object& object,
-                     JsonValue& scratch) {
+                     ReadScratch& scratch) {
   const std::shared_ptr<const StyleCategory> category = style.GetCategory();
   std::vector<std::pair<const BaseStyleProperty*, typename Access::Value>> deprecated;
   std::vector<const BaseStyleProperty*> needAdjustment;
@@ -204,14 +258,17 @@ void StyleJson::Read(Style& style, const StyleSheet& sheet, const typename Acces
         deprecated.emplace_back(behaviour, value);
         continue;
       }
-      behaviour->Deserialize(sheet, &style, Access::ForBehaviour(value, scratch));
+      const std::optional<std::u16string_view> text = Access::AsString(value);
+      if (text && ReadPlain(scratch.KindOf(*behaviour), *behaviour, style.m_properties, *text))
+        continue;
+      behaviour->Deserialize(sheet, &style, Access::ForBehaviour(value, scratch.value));
       if (behaviour->NeedAdjustementsForStyleIO())
         needAdjustment.push_back(behaviour);
     }
   }
   // Deprecated properties are read after all current ones, deliberately.
   for (const auto& [behaviour, value] : deprecated)
-    behaviour->Deserialize(sheet, &style, Access::ForBehaviour(value, scratch));
+    behaviour->Deserialize(sheet, &style, Access::ForBehaviour(value, scratch.value));
   for (const BaseStyleProperty* behaviour : needAdjustment)
     behaviour->AdjustAfterDeserialize(sheet, &style);
 }
@@ -230,9 +287,9 @@ Style* StyleJson::ResolveParent(const StyleSheet& sheet, std::u16string_view nam
 }
 
 template void StyleJson::Read<TreeAccess>(Style&, const StyleSheet&, const Json::Object&,
-                                          JsonValue&);
+                                          ReadScratch&);
 template void StyleJson::Read<DocumentAccess>(Style&, const StyleSheet&, const Json::Document::Ref&,
-                                              JsonValue&);
+                                              ReadScratch&);
 
 } // namespace detail
 
@@ -248,7 +305,7 @@ ZelStringT<char16_t> Style::Serialize(const StyleSheet& sheet, bool format,
 }
 
 void Style::DeserializeJson(const StyleSheet& sheet, const Json::Object& object) {
-  JsonValue scratch;
+  detail::StyleJson::ReadScratch scratch;
   detail::StyleJson::Read<detail::TreeAccess>(*this, sheet, object, scratch);
 }
 

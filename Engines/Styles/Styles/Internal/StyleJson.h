@@ -15,12 +15,28 @@ namespace detail {
 
 class StyleJson {
 public:
+  // What reading styles keeps from one style to the next: a value reused for
+  // members, and how each behaviour met reads a string value, found once by
+  // its type (behaviours live unchanged through one import).
+  class ReadScratch {
+  public:
+    enum Kind : unsigned char { kUnknown, kGeneral, kText, kNumber };
+    JsonValue value;
+    // kText or kNumber for an exact StyleProperty with the stock text or
+    // number policy, whose reading is known; kGeneral for any other.
+    Kind KindOf(const BaseStyleProperty& behaviour);
+
+  private:
+    static constexpr std::size_t kSlots = 64;
+    const BaseStyleProperty* m_behaviours[kSlots] = {};
+    Kind m_kinds[kSlots] = {};
+  };
   // Reads the members of a style's object, held as Access describes it (a
-  // value tree or a compact document), into `style`; `scratch` is reused for
-  // values. Exceptions of behaviours pass through.
+  // value tree or a compact document), into `style`; `scratch` is reused.
+  // Exceptions of behaviours pass through.
   template <class Access>
   static void Read(Style& style, const StyleSheet& sheet, const typename Access::Object& object,
-                   JsonValue& scratch);
+                   ReadScratch& scratch);
   // Fills `out` with the style's object as a value tree.
   static void Write(const Style& style, const StyleSheet& sheet, JsonValue& out,
                     bool includeTemporary);
