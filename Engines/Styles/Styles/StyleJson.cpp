@@ -178,6 +178,10 @@ StyleJson::ReadScratch::Kind StyleJson::ReadScratch::KindOf(const BaseStylePrope
       else if (typeid(*policy) == typeid(ZelPref::NumberConversionPolicy))
         kind = kNumber;
     }
+  } else if (typeid(behaviour) == typeid(StyleSetProperty)) {
+    kind = kSubstyle;
+  } else if (typeid(behaviour) == typeid(StyleArrayProperty)) {
+    kind = kSubstyleList;
   }
   if (!m_behaviours[slot]) {
     m_behaviours[slot] = &behaviour;
@@ -213,6 +217,47 @@ bool ReadPlain(StyleJson::ReadScratch::Kind kind, const BaseStyleProperty& behav
 }
 
 } // namespace
+
+template <class Access>
+bool StyleJson::ReadSubstyles(ReadScratch::Kind kind, const BaseStyleProperty& behaviour,
+                              Style& style, const StyleSheet& sheet, typename Access::Value value,
+                              ReadScratch& scratch) {
+  if (kind == ReadScratch::kSubstyle) {
+    const auto object = Access::AsObject(value);
+    if (!object)
+      return false;
+    std::unique_ptr<Style> substyle(new Style(nullptr, behaviour.GetElementCategoryName()));
+    Read<Access>(*substyle, sheet, *object, scratch);
+    substyle->SetOwner(&style, behaviour.GetName());
+    // Adopted as it is; an own value already there (a repeated member) stays.
+    if (style.m_properties.Insert(behaviour.GetName(), ZelUtils::Any(substyle.get())))
+      substyle.release();
+    return true;
+  }
+  if (kind != ReadScratch::kSubstyleList)
+    return false;
+  const auto array = Access::AsArray(value);
+  if (!array)
+    return false;
+  const PropertyKey elementCategory = behaviour.GetElementCategoryName();
+  const PropertyKey& category =
+      elementCategory == PropertyKey::Empty ? behaviour.GetCategoryKey() : elementCategory;
+  std::vector<std::unique_ptr<Style>> read;
+  read.reserve(Access::Size(*array));
+  for (std::size_t i = 0; i < Access::Size(*array); ++i) {
+    if (const auto object = Access::AsObject(Access::Element(*array, i))) {
+      read.emplace_back(new Style(nullptr, category));
+      Read<Access>(*read.back(), sheet, *object, scratch);
+    }
+  }
+  std::vector<Style*> list;
+  list.reserve(read.size());
+  for (const std::unique_ptr<Style>& substyle : read)
+    list.push_back(substyle.get());
+  // The style stores copies; the substyles read here are freed with `read`.
+  style.SetProperty(behaviour.GetName(), std::move(list));
+  return true;
+}
 
 template <class Access>
 void StyleJson::Read(Style& style, const StyleSheet& sheet, const typename Access::Object& object,
@@ -258,10 +303,12 @@ void StyleJson::Read(Style& style, const StyleSheet& sheet, const typename Acces
         deprecated.emplace_back(behaviour, value);
         continue;
       }
+      const ReadScratch::Kind kind = scratch.KindOf(*behaviour);
       const std::optional<std::u16string_view> text = Access::AsString(value);
-      if (text && ReadPlain(scratch.KindOf(*behaviour), *behaviour, style.m_properties, *text))
+      if (text && ReadPlain(kind, *behaviour, style.m_properties, *text))
         continue;
-      behaviour->Deserialize(sheet, &style, Access::ForBehaviour(value, scratch.value));
+      if (!ReadSubstyles<Access>(kind, *behaviour, style, sheet, value, scratch))
+        behaviour->Deserialize(sheet, &style, Access::ForBehaviour(value, scratch.value));
       if (behaviour->NeedAdjustementsForStyleIO())
         needAdjustment.push_back(behaviour);
     }

@@ -20,10 +20,12 @@ public:
   // its type (behaviours live unchanged through one import).
   class ReadScratch {
   public:
-    enum Kind : unsigned char { kUnknown, kGeneral, kText, kNumber };
+    enum Kind : unsigned char { kUnknown, kGeneral, kText, kNumber, kSubstyle, kSubstyleList };
     JsonValue value;
-    // kText or kNumber for an exact StyleProperty with the stock text or
-    // number policy, whose reading is known; kGeneral for any other.
+    // How a behaviour's Deserialize is known to read: kText or kNumber for an
+    // exact StyleProperty with the stock text or number policy, kSubstyle and
+    // kSubstyleList for an exact StyleSetProperty and StyleArrayProperty;
+    // kGeneral for any other.
     Kind KindOf(const BaseStyleProperty& behaviour);
 
   private:
@@ -61,6 +63,13 @@ public:
                     bool includeTemporary, TextScratch& scratch);
 
 private:
+  // What the Deserialize of a behaviour of kind kSubstyle or kSubstyleList
+  // does, read from the object or array where it is. False for a value of
+  // another form, which the general way takes.
+  template <class Access>
+  static bool ReadSubstyles(ReadScratch::Kind kind, const BaseStyleProperty& behaviour,
+                            Style& style, const StyleSheet& sheet, typename Access::Value value,
+                            ReadScratch& scratch);
   // Hands the members of the style's object to `sink`, in their order.
   template <class Sink>
   static void WriteMembers(const Style& style, const StyleSheet& sheet, bool includeTemporary,
