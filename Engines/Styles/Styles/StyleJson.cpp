@@ -171,16 +171,17 @@ StyleJson::ReadScratch::Kind StyleJson::ReadScratch::KindOf(const BaseStylePrope
       break;
   }
   Kind kind = kGeneral;
-  if (typeid(behaviour) == typeid(StyleProperty)) {
+  const std::type_info& type = typeid(behaviour);
+  if (type == typeid(StyleProperty)) {
     if (const ZelPref::ConversionPolicy* policy = behaviour.GetConversionPolicy()) {
       if (typeid(*policy) == typeid(ZelPref::TextConversionPolicy))
         kind = kText;
       else if (typeid(*policy) == typeid(ZelPref::NumberConversionPolicy))
         kind = kNumber;
     }
-  } else if (typeid(behaviour) == typeid(StyleSetProperty)) {
+  } else if (type == typeid(StyleSetProperty)) {
     kind = kSubstyle;
-  } else if (typeid(behaviour) == typeid(StyleArrayProperty)) {
+  } else if (type == typeid(StyleArrayProperty)) {
     kind = kSubstyleList;
   }
   if (!m_behaviours[slot]) {
