@@ -233,7 +233,8 @@ private:
   }
 
   // The rest of a string from its first escape at p: decoded into the copies.
-  const char16_t* Escaped(const char16_t* start, const char16_t* p, std::uint8_t kind) {
+  // Kept apart so that the usual string, without escapes, takes a short path.
+  [[gnu::noinline]] const char16_t* Escaped(const char16_t* start, const char16_t* p, std::uint8_t kind) {
     const std::size_t offset = m_copies.size();
     m_copies.append(start, static_cast<std::size_t>(p - start));
     for (;;) {
