@@ -193,6 +193,19 @@ StyleJson::ReadScratch::Kind StyleJson::ReadScratch::KindOf(const BaseStylePrope
 
 namespace {
 
+enum class FixedMember { kNone, kInherits, kExternalID, kExternalName };
+
+// Which fixed member `name` names; most names start with another letter.
+FixedMember FixedMemberOf(std::u16string_view name) {
+  if (name.empty() || (name[0] != u'i' && name[0] != u'o'))
+    return FixedMember::kNone;
+  if (name == k_strPropertyInherits)
+    return FixedMember::kInherits;
+  if (name == k_strExternalID)
+    return FixedMember::kExternalID;
+  return name == k_strExternalName ? FixedMember::kExternalName : FixedMember::kNone;
+}
+
 // Reads the string value of a plain property of the kind given (kText or
 // kNumber) as its Deserialize would: its values own nothing and need no
 // adjustment. False when the general way must be taken: for other kinds, and
@@ -271,14 +284,14 @@ void StyleJson::Read(Style& style, const StyleSheet& sheet, const typename Acces
   std::size_t fixedMembers = 0;
   for (std::size_t i = 0; i < count; ++i) {
     const std::u16string_view name = Access::Name(object, i);
-    fixedMembers +=
-        name == k_strPropertyInherits || name == k_strExternalID || name == k_strExternalName;
+    fixedMembers += FixedMemberOf(name) != FixedMember::kNone;
   }
   style.m_properties.Reserve(style.m_properties.size() + count - fixedMembers);
   for (std::size_t i = 0; i < count; ++i) {
     const std::u16string_view name = Access::Name(object, i);
     const typename Access::Value value = Access::Member(object, i);
-    if (name == k_strPropertyInherits) {
+    const FixedMember fixed = FixedMemberOf(name);
+    if (fixed == FixedMember::kInherits) {
       const std::optional<std::u16string_view> parentName = Access::AsString(value);
       if (!parentName || parentName->empty())
         continue;
@@ -287,11 +300,11 @@ void StyleJson::Read(Style& style, const StyleSheet& sheet, const typename Acces
       // a parent cycle would make every lookup endless.
       if (parent && sheet.AcceptParent(style, *parent))
         style.SetParent(parent);
-    } else if (name == k_strExternalID) {
+    } else if (fixed == FixedMember::kExternalID) {
       const std::optional<std::u16string_view> id = Access::AsString(value);
       if (id && !id->empty())
         style.SetExternalID(ZelStringT<char16_t>(*id));
-    } else if (name == k_strExternalName) {
+    } else if (fixed == FixedMember::kExternalName) {
       const std::optional<std::u16string_view> externalName = Access::AsString(value);
       if (externalName && !externalName->empty())
         style.SetExternalName(ZelStringT<char16_t>(*externalName));
