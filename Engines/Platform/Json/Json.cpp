@@ -1,5 +1,6 @@
 #include <Json/Json.h>
 
+#include <Internal/DocumentScan.h>
 #include <Internal/JsonText.h>
 
 namespace Json {
@@ -45,56 +46,6 @@ constexpr char16_t kByteOrderMark = 0xFEFF;
 using ZelPlatform::detail::HasUnpairedSurrogate;
 using ZelPlatform::detail::ReplaceUnpairedSurrogates;
 
-// The decimal exponent of the first non-zero digit of a JSON number, with
-// the exponent part clamped so that it cannot overflow; 0 when all digits are 0.
-long LeadingDecimalExponent(std::string_view number) {
-  std::size_t i = number.empty() || number[0] != '-' ? 0 : 1;
-  const std::size_t integerEnd = std::min(number.find_first_of(".eE", i), number.size());
-  long position = static_cast<long>(integerEnd - i) - 1; // exponent of the digit at i
-  for (; i < number.size() && number[i] != 'e' && number[i] != 'E'; ++i) {
-    if (number[i] == '.')
-      continue;
-    if (number[i] != '0')
-      break;
-    --position;
-  }
-  if (i == number.size() || number[i] == 'e' || number[i] == 'E')
-    return 0;
-  const std::size_t e = number.find_first_of("eE", i);
-  if (e == std::string_view::npos)
-    return position;
-  std::size_t k = e + 1;
-  const bool negative = k < number.size() && number[k] == '-';
-  if (k < number.size() && (number[k] == '-' || number[k] == '+'))
-    ++k;
-  long exponent = 0;
-  for (; k < number.size() && exponent < 100000000; ++k)
-    exponent = exponent * 10 + (number[k] - '0');
-  return position + (negative ? -exponent : exponent);
-}
-
-// Converts the text of a JSON number, correctly rounded. Returns false when
-// its magnitude is too big for a double; one too small becomes a signed zero.
-bool ReadNumber(const char16_t* text, std::size_t length, double& number) {
-  char fixed[64];
-  std::string grown;
-  char* ascii = fixed;
-  if (length > sizeof fixed) {
-    grown.resize(length);
-    ascii = grown.data();
-  }
-  for (std::size_t i = 0; i < length; ++i)
-    ascii[i] = static_cast<char>(text[i]);
-  const std::from_chars_result result = std::from_chars(ascii, ascii + length, number);
-  if (result.ec == std::errc() && result.ptr == ascii + length)
-    return true;
-  if (result.ec != std::errc::result_out_of_range ||
-      LeadingDecimalExponent(std::string_view(ascii, length)) >= 0)
-    return false;
-  number = ascii[0] == '-' ? -0.0 : 0.0;
-  return true;
-}
-
 ZelStringT<char16_t> Widen(std::string_view ascii) {
   return ZelStringT<char16_t>(std::u16string(ascii.begin(), ascii.end()));
 }
@@ -115,7 +66,7 @@ public:
   bool Double(double number) { return Self().Number(number); }
   bool RawNumber(const Ch* text, SizeType length, bool) {
     double number = 0;
-    if (!ReadNumber(text, length, number))
+    if (!detail::ReadNumber(text, length, number))
       return Self().Fail("Number too big to be stored in double");
     return Self().Number(number);
   }
@@ -601,6 +552,17 @@ bool Document::Read(std::u16string_view text, ZelStringT<char16_t>& errorText) {
   // saves most of the arrays' growth steps.
   m_nodes.reserve(source.size() / 8 + 16);
   m_kinds.reserve(source.size() / 8 + 16);
+  // Plainly well-formed text takes the quick scan; the reader reads the rest
+  // afresh, with its exact messages.
+  if (detail::ScanDocument(source, m_copies, m_numbers, m_nodes, m_kinds)) {
+    errorText = ZelStringT<char16_t>();
+    m_source = source.data();
+    return true;
+  }
+  m_copies.clear();
+  m_numbers.clear();
+  m_nodes.clear();
+  m_kinds.clear();
   // The text is NUL-terminated, as the stream needs.
   rapidjson::GenericStringStream<Utf16> stream(source.data());
   DocumentBuilder builder(stream, source, m_copies, m_numbers, m_nodes, m_kinds);

@@ -13,6 +13,7 @@
 #include <cstring>
 #include <limits>
 #include <type_traits>
+#include <vector>
 
 namespace ZelPlatform {
 namespace detail {
@@ -159,19 +160,51 @@ std::size_t FoldRun(std::u16string_view run, std::u16string& out, std::size_t at
   return count;
 }
 
+// Units from U+0080 up to here (Latin, Greek, Cyrillic, Armenian) fold
+// through a table.
+constexpr char16_t kFoldTableEnd = 0x0600;
+
+// Marks a unit that folds to more than one unit (U+00DF folds to "ss"); no
+// unit of the table folds to this noncharacter.
+constexpr char16_t kNotSingle = 0xFFFF;
+
+// The full folding of each unit from U+0080 below kFoldTableEnd, taken from
+// ICU once; kNotSingle for those that ICU keeps folding.
+const char16_t* SingleUnitFoldings() {
+  static const std::vector<char16_t> table = [] {
+    std::vector<char16_t> units(kFoldTableEnd - 0x80, kNotSingle);
+    for (char16_t c = 0x80; c < kFoldTableEnd; ++c) {
+      char16_t folded[4];
+      UErrorCode status = U_ZERO_ERROR;
+      const int32_t length = u_strFoldCase(folded, 4, &c, 1, U_FOLD_CASE_DEFAULT, &status);
+      if (U_SUCCESS(status) && length == 1)
+        units[c - 0x80] = folded[0];
+    }
+    return units;
+  }();
+  return table.data();
+}
+
 } // namespace
 
 void FoldCaseUtf16(std::u16string_view text, std::u16string& out) {
   out.resize(text.size());
+  const char16_t* const table = SingleUnitFoldings();
+  // ASCII and the table's units fold here, one for one; neither is a surrogate.
+  const auto folding = [table](char16_t c) -> char16_t {
+    if (c < 0x80)
+      return static_cast<char16_t>(FoldAscii(c));
+    return c < kFoldTableEnd ? table[c - 0x80] : kNotSingle;
+  };
   std::size_t length = 0;
   std::size_t i = 0;
   while (i < text.size()) {
-    for (; i < text.size() && text[i] < 0x80; ++i)
-      out[length++] = static_cast<char16_t>(FoldAscii(text[i]));
+    for (char16_t folded; i < text.size() && (folded = folding(text[i])) != kNotSingle; ++i)
+      out[length++] = folded;
     // Full folding maps each code point on its own, so the runs between
-    // ASCII units fold apart; an ASCII unit never splits a surrogate pair.
+    // units folded here fold apart, and those units never split a pair.
     const std::size_t start = i;
-    while (i < text.size() && text[i] >= 0x80)
+    while (i < text.size() && folding(text[i]) == kNotSingle)
       ++i;
     if (i > start)
       length += FoldRun(text.substr(start, i - start), out, length, text.size() - i);

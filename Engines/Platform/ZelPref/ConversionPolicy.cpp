@@ -195,27 +195,30 @@ char16_t* NumberConversionPolicy::WriteText(double number, char16_t* out) noexce
 // one rounding of the division gives the correctly rounded value. False for
 // any other form, which the general reader takes.
 bool ReadShortDecimal(std::u16string_view text, double& value) {
-  constexpr double kPowers[] = {1e0, 1e1, 1e2,  1e3,  1e4,  1e5,  1e6,  1e7,
-                                1e8, 1e9, 1e10, 1e11, 1e12, 1e13, 1e14, 1e15};
-  std::size_t i = 0;
-  const bool negative = !text.empty() && text[0] == u'-';
-  i += negative;
+  static constexpr double kPowers[] = {1e0, 1e1, 1e2,  1e3,  1e4,  1e5,  1e6,  1e7,
+                                       1e8, 1e9, 1e10, 1e11, 1e12, 1e13, 1e14, 1e15};
+  const char16_t* p = text.data();
+  const char16_t* const end = p + text.size();
+  const bool negative = p != end && *p == u'-';
+  p += negative;
   std::uint64_t digits = 0;
-  int count = 0, decimals = -1;
-  for (; i < text.size(); ++i) {
-    const char16_t c = text[i];
-    if (c == u'.' && decimals < 0) {
-      decimals = 0;
-      continue;
-    }
-    if (c < u'0' || c > u'9' || ++count > 15)
+  std::size_t count = 0;
+  const char16_t* point = nullptr;
+  for (; p != end; ++p) {
+    const unsigned digit = static_cast<unsigned>(*p) - u'0';
+    if (digit < 10) {
+      digits = digits * 10 + digit; // wraps only past 15 digits, which fail below
+      ++count;
+    } else if (*p != u'.' || point) {
       return false;
-    digits = digits * 10 + static_cast<std::uint64_t>(c - u'0');
-    decimals += decimals >= 0;
+    } else {
+      point = p;
+    }
   }
-  if (count == 0 || decimals == 0)
+  const std::size_t decimals = point ? static_cast<std::size_t>(end - point - 1) : 0;
+  if (count == 0 || count > 15 || (point && decimals == 0))
     return false; // "", "-", "." and "5." go to the general reader
-  const double magnitude = static_cast<double>(digits) / kPowers[decimals < 0 ? 0 : decimals];
+  const double magnitude = static_cast<double>(digits) / kPowers[decimals];
   value = negative ? -magnitude : magnitude;
   return true;
 }

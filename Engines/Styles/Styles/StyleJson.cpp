@@ -160,9 +160,122 @@ void StyleJson::Write(const Style& style, const StyleSheet& sheet, Json::Writer&
   writer.EndObject();
 }
 
+StyleJson::ReadScratch::Kind StyleJson::ReadScratch::KindOf(const BaseStyleProperty& behaviour) {
+  // Addresses are multiples of the allocation alignment; mix the bits.
+  std::size_t slot = static_cast<std::size_t>(
+      (reinterpret_cast<std::uintptr_t>(&behaviour) >> 4) * 0x9E3779B97F4A7C15ull >> 58);
+  for (std::size_t probe = 0; probe < kSlots; ++probe, slot = (slot + 1) % kSlots) {
+    if (m_behaviours[slot] == &behaviour)
+      return m_kinds[slot];
+    if (!m_behaviours[slot])
+      break;
+  }
+  Kind kind = kGeneral;
+  const std::type_info& type = typeid(behaviour);
+  if (type == typeid(StyleProperty)) {
+    if (const ZelPref::ConversionPolicy* policy = behaviour.GetConversionPolicy()) {
+      if (typeid(*policy) == typeid(ZelPref::TextConversionPolicy))
+        kind = kText;
+      else if (typeid(*policy) == typeid(ZelPref::NumberConversionPolicy))
+        kind = kNumber;
+    }
+  } else if (type == typeid(StyleSetProperty)) {
+    kind = kSubstyle;
+  } else if (type == typeid(StyleArrayProperty)) {
+    kind = kSubstyleList;
+  }
+  if (!m_behaviours[slot]) {
+    m_behaviours[slot] = &behaviour;
+    m_kinds[slot] = kind;
+  }
+  return kind;
+}
+
+namespace {
+
+enum class FixedMember { kNone, kInherits, kExternalID, kExternalName };
+
+// Which fixed member `name` names; most names start with another letter.
+FixedMember FixedMemberOf(std::u16string_view name) {
+  if (name.empty() || (name[0] != u'i' && name[0] != u'o'))
+    return FixedMember::kNone;
+  if (name == k_strPropertyInherits)
+    return FixedMember::kInherits;
+  if (name == k_strExternalID)
+    return FixedMember::kExternalID;
+  return name == k_strExternalName ? FixedMember::kExternalName : FixedMember::kNone;
+}
+
+// Reads the string value of a plain property of the kind given (kText or
+// kNumber) as its Deserialize would: its values own nothing and need no
+// adjustment. False when the general way must be taken: for other kinds, and
+// for a number the policy rejects.
+bool ReadPlain(StyleJson::ReadScratch::Kind kind, const BaseStyleProperty& behaviour,
+               PropertyMap& properties, std::u16string_view text) {
+  ZelUtils::Any value;
+  if (kind == StyleJson::ReadScratch::kText) {
+    value = ZelUtils::Any(ZelStringT<char16_t>(text));
+  } else if (kind == StyleJson::ReadScratch::kNumber) {
+    try {
+      value = behaviour.GetConversionPolicy()->FromText(ZelStringT<char16_t>(text));
+    } catch (const ZelPref::Detail::BadConversion&) {
+      return false;
+    }
+  } else {
+    return false;
+  }
+  // A repeated member replaces the value read before it.
+  if (!properties.Insert(behaviour.GetName(), std::move(value)))
+    *properties.Find(behaviour.GetName()) = std::move(value);
+  return true;
+}
+
+} // namespace
+
+template <class Access>
+bool StyleJson::ReadSubstyles(ReadScratch::Kind kind, const BaseStyleProperty& behaviour,
+                              Style& style, const StyleSheet& sheet, typename Access::Value value,
+                              ReadScratch& scratch) {
+  if (kind == ReadScratch::kSubstyle) {
+    const auto object = Access::AsObject(value);
+    if (!object)
+      return false;
+    std::unique_ptr<Style> substyle(new Style(nullptr, behaviour.GetElementCategoryName()));
+    Read<Access>(*substyle, sheet, *object, scratch);
+    substyle->SetOwner(&style, behaviour.GetName());
+    // Adopted as it is; an own value already there (a repeated member) stays.
+    if (style.m_properties.Insert(behaviour.GetName(), ZelUtils::Any(substyle.get())))
+      substyle.release();
+    return true;
+  }
+  if (kind != ReadScratch::kSubstyleList)
+    return false;
+  const auto array = Access::AsArray(value);
+  if (!array)
+    return false;
+  const PropertyKey elementCategory = behaviour.GetElementCategoryName();
+  const PropertyKey& category =
+      elementCategory == PropertyKey::Empty ? behaviour.GetCategoryKey() : elementCategory;
+  std::vector<std::unique_ptr<Style>> read;
+  read.reserve(Access::Size(*array));
+  for (std::size_t i = 0; i < Access::Size(*array); ++i) {
+    if (const auto object = Access::AsObject(Access::Element(*array, i))) {
+      read.emplace_back(new Style(nullptr, category));
+      Read<Access>(*read.back(), sheet, *object, scratch);
+    }
+  }
+  std::vector<Style*> list;
+  list.reserve(read.size());
+  for (const std::unique_ptr<Style>& substyle : read)
+    list.push_back(substyle.get());
+  // The style stores copies; the substyles read here are freed with `read`.
+  style.SetProperty(behaviour.GetName(), std::move(list));
+  return true;
+}
+
 template <class Access>
 void StyleJson::Read(Style& style, const StyleSheet& sheet, const typename Access::Object& object,
-                     JsonValue& scratch) {
+                     ReadScratch& scratch) {
   const std::shared_ptr<const StyleCategory> category = style.GetCategory();
   std::vector<std::pair<const BaseStyleProperty*, typename Access::Value>> deprecated;
   std::vector<const BaseStyleProperty*> needAdjustment;
@@ -171,14 +284,14 @@ void StyleJson::Read(Style& style, const StyleSheet& sheet, const typename Acces
   std::size_t fixedMembers = 0;
   for (std::size_t i = 0; i < count; ++i) {
     const std::u16string_view name = Access::Name(object, i);
-    fixedMembers +=
-        name == k_strPropertyInherits || name == k_strExternalID || name == k_strExternalName;
+    fixedMembers += FixedMemberOf(name) != FixedMember::kNone;
   }
   style.m_properties.Reserve(style.m_properties.size() + count - fixedMembers);
   for (std::size_t i = 0; i < count; ++i) {
     const std::u16string_view name = Access::Name(object, i);
     const typename Access::Value value = Access::Member(object, i);
-    if (name == k_strPropertyInherits) {
+    const FixedMember fixed = FixedMemberOf(name);
+    if (fixed == FixedMember::kInherits) {
       const std::optional<std::u16string_view> parentName = Access::AsString(value);
       if (!parentName || parentName->empty())
         continue;
@@ -187,11 +300,11 @@ void StyleJson::Read(Style& style, const StyleSheet& sheet, const typename Acces
       // a parent cycle would make every lookup endless.
       if (parent && sheet.AcceptParent(style, *parent))
         style.SetParent(parent);
-    } else if (name == k_strExternalID) {
+    } else if (fixed == FixedMember::kExternalID) {
       const std::optional<std::u16string_view> id = Access::AsString(value);
       if (id && !id->empty())
         style.SetExternalID(ZelStringT<char16_t>(*id));
-    } else if (name == k_strExternalName) {
+    } else if (fixed == FixedMember::kExternalName) {
       const std::optional<std::u16string_view> externalName = Access::AsString(value);
       if (externalName && !externalName->empty())
         style.SetExternalName(ZelStringT<char16_t>(*externalName));
@@ -204,14 +317,19 @@ void StyleJson::Read(Style& style, const StyleSheet& sheet, const typename Acces
         deprecated.emplace_back(behaviour, value);
         continue;
       }
-      behaviour->Deserialize(sheet, &style, Access::ForBehaviour(value, scratch));
+      const ReadScratch::Kind kind = scratch.KindOf(*behaviour);
+      const std::optional<std::u16string_view> text = Access::AsString(value);
+      if (text && ReadPlain(kind, *behaviour, style.m_properties, *text))
+        continue;
+      if (!ReadSubstyles<Access>(kind, *behaviour, style, sheet, value, scratch))
+        behaviour->Deserialize(sheet, &style, Access::ForBehaviour(value, scratch.value));
       if (behaviour->NeedAdjustementsForStyleIO())
         needAdjustment.push_back(behaviour);
     }
   }
   // Deprecated properties are read after all current ones, deliberately.
   for (const auto& [behaviour, value] : deprecated)
-    behaviour->Deserialize(sheet, &style, Access::ForBehaviour(value, scratch));
+    behaviour->Deserialize(sheet, &style, Access::ForBehaviour(value, scratch.value));
   for (const BaseStyleProperty* behaviour : needAdjustment)
     behaviour->AdjustAfterDeserialize(sheet, &style);
 }
@@ -230,9 +348,9 @@ Style* StyleJson::ResolveParent(const StyleSheet& sheet, std::u16string_view nam
 }
 
 template void StyleJson::Read<TreeAccess>(Style&, const StyleSheet&, const Json::Object&,
-                                          JsonValue&);
+                                          ReadScratch&);
 template void StyleJson::Read<DocumentAccess>(Style&, const StyleSheet&, const Json::Document::Ref&,
-                                              JsonValue&);
+                                              ReadScratch&);
 
 } // namespace detail
 
@@ -248,7 +366,7 @@ ZelStringT<char16_t> Style::Serialize(const StyleSheet& sheet, bool format,
 }
 
 void Style::DeserializeJson(const StyleSheet& sheet, const Json::Object& object) {
-  JsonValue scratch;
+  detail::StyleJson::ReadScratch scratch;
   detail::StyleJson::Read<detail::TreeAccess>(*this, sheet, object, scratch);
 }
 

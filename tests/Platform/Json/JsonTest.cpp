@@ -212,6 +212,7 @@ TEST(JsonTest, BadTextFailsAndLeavesValueAlone) {
   const char16_t reversedPair[] = {u'"', 0xDC00, 0xD800, u'"', 0};
   const char16_t loneInName[] = {u'{', u'"', 0xDBFF, u'"', u':', u'1', u'}', 0};
   const char16_t nulInside[] = {u'[', u'1', u']', 0, u'x'};
+  const char16_t controlInside[] = {u'[', u'"', 0x1F, u'"', u']', 0};
   std::u16string deepObjects;
   for (int i = 0; i <= Json::kMaxDepth; ++i)
     deepObjects += u"{\"a\":";
@@ -233,6 +234,9 @@ TEST(JsonTest, BadTextFailsAndLeavesValueAlone) {
       {"escaped lone surrogate", {u"\"\\uD800\"", u"\"\\uDC00\"", u"{\"\\uDC00\":1}"}},
       {"raw lone surrogate", {loneHigh, loneLow, reversedPair, loneInName}},
       {"too deep", {Text(Json::kMaxDepth + 1, u'['), Text(deepObjects), Text(1000000, u'[')}},
+      {"inside a container",
+       {u"[0e400]", u"{\"a\":-0E+309}", u"[1}", u"{\"a\":1]", controlInside, u"[tru]", u"{\"a\" 1}",
+        u"[\"\\a\"]", u"[1,]", u"{\"a\":1,}", u"[-]", u"[1.]", u"[1e+]"}},
   };
   for (const Case& c : cases) {
     for (const Text& text : c.texts) {
@@ -262,6 +266,10 @@ TEST(JsonTest, AcceptsLimitsOfGoodText) {
   EXPECT_TRUE(Json::Parse(u"\uFEFF \"\\ud83d\\ude00\\u0000\" ", value, error));
   EXPECT_EQ(value, Value(Text(u"\U0001F600\0", 3)));
   EXPECT_TRUE(error.IsEmpty());
+  // A document with an escaped pair is read by the general reader, escapes
+  // and numbers beside it too.
+  EXPECT_EQ(ParseOrFail(u"[\"\\ud83d\\ude00\", \"a\\nb\", 0.5]"),
+            Value(Array({u"\U0001F600", u"a\nb", 0.5})));
 }
 
 TEST(JsonTest, EqualityIsDeepAndOrderedAcrossKinds) {

@@ -92,6 +92,15 @@ TEST(ZelStringTest, FoldCaseFoldsEachRunInPlace) {
     ZelPlatform::detail::FoldCaseUtf16(c.in, folded);
     EXPECT_EQ(Narrow(folded), Narrow(c.expected)) << Narrow(c.in);
   }
+  // Latin, Greek, Cyrillic and Armenian units fold through a table: each
+  // folding matches the unit without case and folds to itself again.
+  std::u16string again;
+  for (char16_t unit = 0x80; unit < 0x600; ++unit) {
+    ZelPlatform::detail::FoldCaseUtf16(std::u16string(1, unit), folded);
+    ZelPlatform::detail::FoldCaseUtf16(folded, again);
+    ASSERT_EQ(String16(std::u16string(1, unit)).CompareNoCase(String16(folded)), 0) << unit;
+    ASSERT_EQ(again, folded) << unit;
+  }
 }
 
 TEST(ZelStringTest, TrimRemovesUnicodeWhiteSpace) {

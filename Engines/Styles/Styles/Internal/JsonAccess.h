@@ -34,6 +34,12 @@ struct TreeAccess {
     const ZelStringT<char16_t>* text = value->GetIf<ZelStringT<char16_t>>();
     return text ? std::optional<std::u16string_view>(text->GetView()) : std::nullopt;
   }
+  static std::optional<const Json::Array*> AsArray(Value value) {
+    const Json::Array* array = value->GetIf<Json::Array>();
+    return array ? std::optional<const Json::Array*>(array) : std::nullopt;
+  }
+  static std::size_t Size(const Json::Array* array) { return array->GetSize(); }
+  static Value Element(const Json::Array* array, std::size_t i) { return &array->GetValue(i); }
   // The value as behaviours take it: the tree's own.
   static const Json::Value& ForBehaviour(Value value, Json::Value&) { return *value; }
 };
@@ -61,9 +67,12 @@ struct DocumentAccess {
     return value.IsNumber() ? std::optional<double>(value.GetNumber()) : std::nullopt;
   }
   static std::optional<std::u16string_view> AsString(Value value) {
-    return value.IsString() ? std::optional<std::u16string_view>(value.GetString())
-                            : std::nullopt;
+    return value.IsString() ? std::optional<std::u16string_view>(value.GetString()) : std::nullopt;
   }
+  static std::optional<Value> AsArray(Value value) {
+    return value.IsArray() ? std::optional<Value>(value) : std::nullopt;
+  }
+  static Value Element(const Value& array, std::size_t i) { return array.GetElement(i); }
   static const Json::Value& ForBehaviour(Value value, Json::Value& scratch) {
     value.AssignTo(scratch);
     return scratch;
