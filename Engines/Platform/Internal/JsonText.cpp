@@ -3,23 +3,41 @@
 #include <algorithm>
 #include <cstdint>
 #include <cstring>
+#include <utility>
 
 namespace Json {
 namespace detail {
 
+void TextOutput::Adopt(std::u16string& storage) {
+  if (m_size > 0)
+    return;
+  m_text.swap(storage);
+  m_text.clear();
+  storage.clear();
+  m_units = nullptr;
+  m_capacity = 0;
+}
+
 std::u16string TextOutput::Take() {
-  std::u16string text(m_units.get(), m_size);
-  m_units.reset();
+  m_text.resize(m_size);
+  m_units = nullptr;
   m_size = m_capacity = 0;
-  return text;
+  return std::move(m_text);
+}
+
+void TextOutput::Expect(std::size_t count) {
+  m_text.reserve(m_size + count);
+  m_units = m_text.data();
 }
 
 void TextOutput::Grow(std::size_t count) {
-  const std::size_t capacity = std::max(m_capacity * 2, m_size + count + 1024);
-  std::unique_ptr<Ch[]> units(new Ch[capacity]);
-  std::copy(m_units.get(), m_units.get() + m_size, units.get());
-  m_units = std::move(units);
-  m_capacity = capacity;
+  // Sized a block past what is asked, within the capacity the string has;
+  // beyond it the string grows geometrically by itself.
+  constexpr std::size_t kBlock = 16384;
+  const std::size_t needed = m_size + count;
+  m_text.resize(std::max(needed, std::min(m_text.capacity(), m_size + count + kBlock)));
+  m_units = m_text.data();
+  m_capacity = m_text.size();
 }
 
 namespace {

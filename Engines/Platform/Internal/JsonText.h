@@ -4,17 +4,17 @@
 #pragma once
 
 #include <cstddef>
-#include <memory>
 #include <string>
 #include <vector>
 
 namespace Json {
 namespace detail {
 
-// Text that grows geometrically and is never cleared first (a string's resize
-// would fill it with zeros); the finished text is copied out once, at its
-// exact length. Put/PutUnsafe/Reserve/Flush are what an output stream of the
-// JSON library offers; Claim and Commit let a writer store units directly.
+// Text that grows into a standard string, which is sized up a block at a time
+// just ahead of the writing (a string's resize fills with zeros, cheap while
+// the block is fresh in cache) and handed out whole at the end, never copied.
+// Put/PutUnsafe/Reserve/Flush are what an output stream of the JSON library
+// offers; Claim and Commit let a writer store units directly.
 class TextOutput {
 public:
   using Ch = char16_t;
@@ -29,19 +29,27 @@ public:
       Grow(count);
   }
   void Flush() {}
+  // Makes the string's capacity room for `count` more units without sizing
+  // it: a hint of the text's length.
+  void Expect(std::size_t count);
   // Room for `count` more units; the units written there count once Commit
   // is given the end of what was written.
   Ch* Claim(std::size_t count) {
     Reserve(count);
-    return m_units.get() + m_size;
+    return m_units + m_size;
   }
-  void Commit(const Ch* end) { m_size = static_cast<std::size_t>(end - m_units.get()); }
+  void Commit(const Ch* end) { m_size = static_cast<std::size_t>(end - m_units); }
+  // Writes into the memory of `storage` from now on, which must be done
+  // before anything is written; `storage` is left empty.
+  void Adopt(std::u16string& storage);
+  // The text written; the output is empty afterwards.
   std::u16string Take();
 
 private:
   void Grow(std::size_t count);
 
-  std::unique_ptr<Ch[]> m_units;
+  std::u16string m_text; // units up to m_size are written, the rest is room
+  Ch* m_units = nullptr; // m_text's units while it has any
   std::size_t m_size = 0;
   std::size_t m_capacity = 0;
 };
