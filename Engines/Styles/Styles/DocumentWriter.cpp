@@ -63,6 +63,7 @@ void DocumentWriter::WriteText(const StyleSheet& sheet, ZelStringT<char16_t>& te
     for (const StyleIndex::Entry* entry : group.second)
       estimate += entry->nameLength + 32 + 48 * entry->style->GetProperties().size();
   Json::Writer writer(false);
+  writer.ReuseStorage(text);
   writer.Reserve(estimate);
   writer.StartObject();
   if (sheet.m_version > 0) {
@@ -73,7 +74,7 @@ void DocumentWriter::WriteText(const StyleSheet& sheet, ZelStringT<char16_t>& te
     writer.Key(k_strExternalID);
     writer.String(sheet.m_externalID.GetView());
   }
-  StyleJson::TextScratch scratch;
+  StyleJson::TextScratch scratch(sheet, includeTemporary);
   for (const auto& [category, entries] : categories) {
     writer.Key(category.GetView());
     writer.StartObject();

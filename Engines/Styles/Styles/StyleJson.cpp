@@ -36,60 +36,80 @@ public:
   void Text(std::u16string_view name, std::u16string_view text) {
     m_object.AddValue(ZelStringT<char16_t>(name), Json::Value(ZelStringT<char16_t>(text)));
   }
-  Json::Value& Value() { return m_value = Json::Value(); }
-  void Member(const ZelStringT<char16_t>& name) { m_object.AddValue(name, std::move(m_value)); }
-  bool Plain(const BaseStyleProperty&, const StyleSheet&, const ZelUtils::Any&,
-             const PropertyKey&) {
-    return false;
+  void Property(const Style& style, const StyleSheet& sheet, bool includeTemporary,
+                const PropertyMap::ConstEntry& entry) {
+    const StyleCategory* category = style.GetCategory().get();
+    const BaseStyleProperty* behaviour =
+        category ? category->GetStyleProperty(entry.first) : nullptr;
+    if (!behaviour || (!includeTemporary && behaviour->IsTemporary()))
+      return;
+    Json::Value value;
+    if (behaviour->Serialize(sheet, &style, entry.second, value))
+      m_object.AddValue(entry.first.GetString(), std::move(value));
   }
 
 private:
   Json::Object& m_object;
-  Json::Value m_value;
 };
 
-// The same members written straight into JSON text.
+// The same members written straight into JSON text. Members whose values are
+// strings wait in the scratch and go to the writer together.
 class WriterSink {
 public:
-  WriterSink(Json::Writer& writer, detail::StyleJson::TextScratch& scratch)
-      : m_writer(writer), m_scratch(scratch) {}
-  void Text(std::u16string_view name, std::u16string_view text) { m_writer.Member(name, text); }
-  Json::Value& Value() { return m_scratch.value; }
-  void Member(const ZelStringT<char16_t>& name) {
-    m_writer.Key(name.GetView());
-    m_writer.Write(m_scratch.value);
+  using TextScratch = detail::StyleJson::TextScratch;
+  WriterSink(Json::Writer& writer, TextScratch& scratch) : m_writer(writer), m_scratch(scratch) {}
+  void Text(std::u16string_view name, std::u16string_view text) {
+    if (m_pending == TextScratch::kBatch)
+      Flush();
+    m_scratch.pending[m_pending++] = {name, text};
   }
-  // A plain property with a stock text or number policy: the member its
-  // Serialize would give, written without making a string or a value. False
-  // when the general way must be taken (it also throws what Serialize throws).
-  bool Plain(const BaseStyleProperty& behaviour, const StyleSheet& sheet,
-             const ZelUtils::Any& value, const PropertyKey& name) {
-    using Kind = detail::StyleJson::TextScratch::Kind;
-    const Kind kind = m_scratch.KindOf(behaviour);
-    if (kind == Kind::kGeneral)
-      return false;
-    if (sheet.GetVersion() < behaviour.GetMinimumVersion())
-      return true;
-    if (kind == Kind::kText) {
-      const auto* text = value.GetIf<ZelStringT<char16_t>>();
-      if (!text)
-        return false;
-      m_writer.Member(name.GetView(), text->GetView());
-      return true;
+  void Property(const Style& style, const StyleSheet& sheet, bool,
+                const PropertyMap::ConstEntry& entry) {
+    const TextScratch::Plan plan = m_scratch.PlanFor(style.GetCategory().get(), entry.first);
+    if (plan.kind == TextScratch::kSkipped || Plain(plan.kind, entry))
+      return;
+    if (plan.behaviour->Serialize(sheet, &style, entry.second, m_scratch.value)) {
+      Flush();
+      m_writer.Key(entry.first.GetView());
+      m_writer.Write(m_scratch.value);
     }
-    const double* number = value.GetIf<double>();
-    if (!number || !std::isfinite(*number))
-      return false;
-    char16_t digits[ZelPref::NumberConversionPolicy::kMaxTextLength];
-    const char16_t* end = ZelPref::NumberConversionPolicy::WriteText(*number, digits);
-    m_writer.Member(name.GetView(),
-                    std::u16string_view(digits, static_cast<std::size_t>(end - digits)));
-    return true;
+  }
+  // Writes the members still waiting.
+  void Flush() {
+    if (m_pending > 0)
+      m_writer.Members(m_scratch.pending, m_pending);
+    m_pending = 0;
   }
 
 private:
+  // A plain property with a stock text or number policy: the member its
+  // Serialize would give, without making a string or a value. False when the
+  // general way must be taken (it also throws what Serialize throws).
+  bool Plain(TextScratch::Kind kind, const PropertyMap::ConstEntry& entry) {
+    if (kind == TextScratch::kText) {
+      const auto* text = entry.second.GetIf<ZelStringT<char16_t>>();
+      if (!text)
+        return false;
+      Text(entry.first.GetView(), text->GetView());
+      return true;
+    }
+    if (kind != TextScratch::kNumber)
+      return false;
+    const double* number = entry.second.GetIf<double>();
+    if (!number || !std::isfinite(*number))
+      return false;
+    if (m_pending == TextScratch::kBatch)
+      Flush();
+    char16_t* digits = m_scratch.digits[m_pending];
+    const char16_t* end = ZelPref::NumberConversionPolicy::WriteText(*number, digits);
+    m_scratch.pending[m_pending++] = {entry.first.GetView(),
+                                      {digits, static_cast<std::size_t>(end - digits)}};
+    return true;
+  }
+
   Json::Writer& m_writer;
-  detail::StyleJson::TextScratch& m_scratch;
+  TextScratch& m_scratch;
+  std::size_t m_pending = 0;
 };
 
 } // namespace
@@ -106,15 +126,8 @@ void StyleJson::WriteMembers(const Style& style, const StyleSheet& sheet, bool i
     sink.Text(k_strExternalID, style.GetExternalID().GetView());
   if (!style.GetExternalName().IsEmpty())
     sink.Text(k_strExternalName, style.GetExternalName().GetView());
-  for (const PropertyMap::ConstEntry& entry : style.GetProperties()) {
-    const BaseStyleProperty* behaviour = style.FindBehaviour(entry.first);
-    if (!behaviour || (!includeTemporary && behaviour->IsTemporary()))
-      continue;
-    if (sink.Plain(*behaviour, sheet, entry.second, entry.first))
-      continue;
-    if (behaviour->Serialize(sheet, &style, entry.second, sink.Value()))
-      sink.Member(entry.first.GetString());
-  }
+  for (const PropertyMap::ConstEntry& entry : style.GetProperties())
+    sink.Property(style, sheet, includeTemporary, entry);
 }
 
 void StyleJson::Write(const Style& style, const StyleSheet& sheet, JsonValue& out,
@@ -125,31 +138,44 @@ void StyleJson::Write(const Style& style, const StyleSheet& sheet, JsonValue& ou
   WriteMembers(style, sheet, includeTemporary, sink);
 }
 
-StyleJson::TextScratch::Kind StyleJson::TextScratch::KindOf(const BaseStyleProperty& behaviour) {
-  // Addresses are multiples of the allocation alignment; mix the bits.
-  std::size_t slot = static_cast<std::size_t>(
-      (reinterpret_cast<std::uintptr_t>(&behaviour) >> 4) * 0x9E3779B97F4A7C15ull >> 58);
-  for (std::size_t probe = 0; probe < kSlots; ++probe, slot = (slot + 1) % kSlots) {
-    if (m_behaviours[slot] == &behaviour)
-      return m_kinds[slot];
-    if (!m_behaviours[slot])
-      break;
-  }
-  // Only an exact StyleProperty is known to write what its policy gives.
-  Kind kind = kGeneral;
-  if (typeid(behaviour) == typeid(StyleProperty)) {
-    if (const ZelPref::ConversionPolicy* policy = behaviour.GetConversionPolicy()) {
-      if (typeid(*policy) == typeid(ZelPref::TextConversionPolicy))
-        kind = kText;
-      else if (typeid(*policy) == typeid(ZelPref::NumberConversionPolicy))
-        kind = kNumber;
+StyleJson::TextScratch::Plan StyleJson::TextScratch::Learn(const StyleCategory* category,
+                                                           const PropertyKey& key) {
+  const BaseStyleProperty* behaviour = category ? category->GetStyleProperty(key) : nullptr;
+  Plan plan{behaviour, kSkipped};
+  if (behaviour && (m_includeTemporary || !behaviour->IsTemporary())) {
+    plan.kind = kGeneral;
+    // Only an exact StyleProperty is known to write what its policy gives.
+    if (typeid(*behaviour) == typeid(StyleProperty)) {
+      if (const ZelPref::ConversionPolicy* policy = behaviour->GetConversionPolicy()) {
+        if (typeid(*policy) == typeid(ZelPref::TextConversionPolicy))
+          plan.kind = kText;
+        else if (typeid(*policy) == typeid(ZelPref::NumberConversionPolicy))
+          plan.kind = kNumber;
+      }
+      // Such a value is left out of a document older than its behaviour.
+      if (plan.kind != kGeneral && m_sheet.GetVersion() < behaviour->GetMinimumVersion())
+        plan.kind = kSkipped;
     }
   }
-  if (!m_behaviours[slot]) {
-    m_behaviours[slot] = &behaviour;
-    m_kinds[slot] = kind;
+  if (2 * (m_filled + 1) > m_slots.size()) {
+    std::vector<Slot> slots(2 * m_slots.size());
+    slots.swap(m_slots);
+    m_filled = 0;
+    for (const Slot& slot : slots)
+      if (slot.filled)
+        Place(slot);
   }
-  return kind;
+  Place(Slot{category, key, plan, true});
+  return plan;
+}
+
+void StyleJson::TextScratch::Place(const Slot& slot) {
+  const std::size_t mask = m_slots.size() - 1;
+  std::size_t i = Hash(slot.category, slot.key) & mask;
+  while (m_slots[i].filled)
+    i = (i + 1) & mask;
+  m_slots[i] = slot;
+  ++m_filled;
 }
 
 void StyleJson::Write(const Style& style, const StyleSheet& sheet, Json::Writer& writer,
@@ -157,6 +183,7 @@ void StyleJson::Write(const Style& style, const StyleSheet& sheet, Json::Writer&
   writer.StartObject();
   WriterSink sink(writer, scratch);
   WriteMembers(style, sheet, includeTemporary, sink);
+  sink.Flush();
   writer.EndObject();
 }
 
