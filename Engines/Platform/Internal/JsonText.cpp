@@ -11,11 +11,11 @@ namespace detail {
 void TextOutput::Adopt(std::u16string& storage) {
   if (m_size > 0)
     return;
+  // The old text is room to write over: sizing it again would fill it first.
   m_text.swap(storage);
-  m_text.clear();
   storage.clear();
-  m_units = nullptr;
-  m_capacity = 0;
+  m_units = m_text.data();
+  m_capacity = m_text.size();
 }
 
 std::u16string TextOutput::Take() {
@@ -103,8 +103,8 @@ char16_t* WriteSpecial(char16_t c, const char16_t*& next, const char16_t* end, c
   return out;
 }
 
-// Writes `text` quoted and escaped at `out` (room for 2 + 6 * length units)
-// and returns the end of it.
+} // namespace
+
 char16_t* WriteQuoted(const char16_t* text, std::size_t length, char16_t* out) {
   *out++ = u'"';
   const char16_t* const end = text + length;
@@ -128,8 +128,6 @@ char16_t* WriteQuoted(const char16_t* text, std::size_t length, char16_t* out) {
   *out++ = u'"';
   return out;
 }
-
-} // namespace
 
 bool CompactWriter::String(const char16_t* text, std::size_t length) {
   if (!Prefix(true))

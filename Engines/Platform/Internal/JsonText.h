@@ -4,6 +4,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstring>
 #include <string>
 #include <vector>
 
@@ -39,8 +40,8 @@ public:
     return m_units + m_size;
   }
   void Commit(const Ch* end) { m_size = static_cast<std::size_t>(end - m_units); }
-  // Writes into the memory of `storage` from now on, which must be done
-  // before anything is written; `storage` is left empty.
+  // Writes into the memory of `storage` from now on, over the text it held;
+  // only before anything is written. `storage` is left empty.
   void Adopt(std::u16string& storage);
   // The text written; the output is empty afterwards.
   std::u16string Take();
@@ -53,6 +54,10 @@ private:
   std::size_t m_size = 0;
   std::size_t m_capacity = 0;
 };
+
+// Writes `text` quoted and escaped at `out` (room for 2 + 6 * length units),
+// unpaired surrogates as U+FFFD, and returns the end of it.
+char16_t* WriteQuoted(const char16_t* text, std::size_t length, char16_t* out);
 
 // The compact layout: exactly the text the JSON library's compact writer gives
 // for the same calls (the same escapes, commas and colons), with unpaired
@@ -76,6 +81,39 @@ public:
   // A name and its string value, as Key and then String write them.
   bool Member(const char16_t* name, std::size_t nameLength, const char16_t* text,
               std::size_t textLength);
+  // Members whose values are strings, each as Member writes it; a member
+  // whose `quotedName` is not empty has that copied as its name.
+  template <class StringMember> bool Members(const StringMember* members, std::size_t count) {
+    if (m_levels.empty() || m_levels.back().inArray || m_levels.back().valueCount % 2 != 0) {
+      for (std::size_t i = 0; i < count; ++i)
+        if (!Member(members[i].name.data(), members[i].name.size(), members[i].text.data(),
+                    members[i].text.size()))
+          return false;
+      return true;
+    }
+    std::size_t room = 0;
+    for (std::size_t i = 0; i < count; ++i)
+      room +=
+          6 + members[i].quotedName.size() + 6 * (members[i].name.size() + members[i].text.size());
+    Level& level = m_levels.back();
+    char16_t* out = m_out.Claim(room);
+    for (std::size_t i = 0; i < count; ++i) {
+      const StringMember& member = members[i];
+      if (level.valueCount > 0)
+        *out++ = u',';
+      level.valueCount += 2;
+      if (member.quotedName.empty()) {
+        out = WriteQuoted(member.name.data(), member.name.size(), out);
+      } else {
+        std::memcpy(out, member.quotedName.data(), member.quotedName.size() * sizeof(char16_t));
+        out += member.quotedName.size();
+      }
+      *out++ = u':';
+      out = WriteQuoted(member.text.data(), member.text.size(), out);
+    }
+    m_out.Commit(out);
+    return true;
+  }
   bool Bool(bool flag) { return flag ? Raw(u"true", 4) : Raw(u"false", 5); }
   bool Null() { return Raw(u"null", 4); }
   // Text written as it is, such as a number's digits; the kind is not used.

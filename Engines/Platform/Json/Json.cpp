@@ -283,10 +283,18 @@ public:
   }
 
   bool WriteMembers(const Json::Writer::StringMember* members, std::size_t count) {
-    for (std::size_t i = 0; i < count; ++i)
-      if (!WriteMember(members[i].name, members[i].text))
-        return false;
-    return true;
+    if constexpr (RepairsSurrogates<Writer>::value) {
+      for (std::size_t i = 0; i < count; ++i)
+        if (members[i].name.size() > std::numeric_limits<SizeType>::max() ||
+            members[i].text.size() > std::numeric_limits<SizeType>::max())
+          return false;
+      return m_writer.Members(members, count);
+    } else {
+      for (std::size_t i = 0; i < count; ++i)
+        if (!WriteMember(members[i].name, members[i].text))
+          return false;
+      return true;
+    }
   }
 
   bool WriteText(std::u16string_view text, bool isKey) {
@@ -748,6 +756,13 @@ bool Writer::Members(const StringMember* members, std::size_t count) {
   return Check(!m_impl->failed && m_impl->Members(members, count));
 }
 bool Writer::Write(const Value& value) { return Check(!m_impl->failed && m_impl->Write(value)); }
+
+ZelStringT<char16_t> Writer::Quote(std::u16string_view text) {
+  std::u16string quoted(2 + 6 * text.size(), u'\0');
+  quoted.resize(static_cast<std::size_t>(
+      detail::WriteQuoted(text.data(), text.size(), quoted.data()) - quoted.data()));
+  return ZelStringT<char16_t>(std::move(quoted));
+}
 
 void Writer::Reserve(std::size_t units) { m_impl->buffer.Expect(units); }
 

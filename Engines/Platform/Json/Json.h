@@ -377,9 +377,14 @@ public:
   struct StringMember {
     std::u16string_view name; ///< The member's name.
     std::u16string_view text; ///< Its string value.
+    /// Empty, or Quote(name): then the compact layout copies it as the name
+    /// instead of escaping the name again.
+    std::u16string_view quotedName = {};
   };
   /// `count` members in order, each as Member writes it, in one call.
   bool Members(const StringMember* members, std::size_t count);
+  /// `text` as a JSON string: quoted and escaped, unpaired surrogates U+FFFD.
+  static ZelStringT<char16_t> Quote(std::u16string_view text);
   /// A whole value, containers included, as ValueToString writes it.
   bool Write(const Value& value);
   /// Makes room for `units` more UTF-16 units of text: a hint, never needed.

@@ -58,15 +58,11 @@ class WriterSink {
 public:
   using TextScratch = detail::StyleJson::TextScratch;
   WriterSink(Json::Writer& writer, TextScratch& scratch) : m_writer(writer), m_scratch(scratch) {}
-  void Text(std::u16string_view name, std::u16string_view text) {
-    if (m_pending == TextScratch::kBatch)
-      Flush();
-    m_scratch.pending[m_pending++] = {name, text};
-  }
+  void Text(std::u16string_view name, std::u16string_view text) { Add({name, text}); }
   void Property(const Style& style, const StyleSheet& sheet, bool,
                 const PropertyMap::ConstEntry& entry) {
     const TextScratch::Plan plan = m_scratch.PlanFor(style.GetCategory().get(), entry.first);
-    if (plan.kind == TextScratch::kSkipped || Plain(plan.kind, entry))
+    if (plan.kind == TextScratch::kSkipped || Plain(plan, entry))
       return;
     if (plan.behaviour->Serialize(sheet, &style, entry.second, m_scratch.value)) {
       Flush();
@@ -82,18 +78,23 @@ public:
   }
 
 private:
+  void Add(const Json::Writer::StringMember& member) {
+    if (m_pending == TextScratch::kBatch)
+      Flush();
+    m_scratch.pending[m_pending++] = member;
+  }
   // A plain property with a stock text or number policy: the member its
   // Serialize would give, without making a string or a value. False when the
   // general way must be taken (it also throws what Serialize throws).
-  bool Plain(TextScratch::Kind kind, const PropertyMap::ConstEntry& entry) {
-    if (kind == TextScratch::kText) {
+  bool Plain(const TextScratch::Plan& plan, const PropertyMap::ConstEntry& entry) {
+    if (plan.kind == TextScratch::kText) {
       const auto* text = entry.second.GetIf<ZelStringT<char16_t>>();
       if (!text)
         return false;
-      Text(entry.first.GetView(), text->GetView());
+      Add({entry.first.GetView(), text->GetView(), plan.quotedName});
       return true;
     }
-    if (kind != TextScratch::kNumber)
+    if (plan.kind != TextScratch::kNumber)
       return false;
     const double* number = entry.second.GetIf<double>();
     if (!number || !std::isfinite(*number))
@@ -102,8 +103,8 @@ private:
       Flush();
     char16_t* digits = m_scratch.digits[m_pending];
     const char16_t* end = ZelPref::NumberConversionPolicy::WriteText(*number, digits);
-    m_scratch.pending[m_pending++] = {entry.first.GetView(),
-                                      {digits, static_cast<std::size_t>(end - digits)}};
+    m_scratch.pending[m_pending++] = {
+        entry.first.GetView(), {digits, static_cast<std::size_t>(end - digits)}, plan.quotedName};
     return true;
   }
 
@@ -141,7 +142,7 @@ void StyleJson::Write(const Style& style, const StyleSheet& sheet, JsonValue& ou
 StyleJson::TextScratch::Plan StyleJson::TextScratch::Learn(const StyleCategory* category,
                                                            const PropertyKey& key) {
   const BaseStyleProperty* behaviour = category ? category->GetStyleProperty(key) : nullptr;
-  Plan plan{behaviour, kSkipped};
+  Plan plan{behaviour, kSkipped, {}};
   if (behaviour && (m_includeTemporary || !behaviour->IsTemporary())) {
     plan.kind = kGeneral;
     // Only an exact StyleProperty is known to write what its policy gives.
@@ -157,6 +158,8 @@ StyleJson::TextScratch::Plan StyleJson::TextScratch::Learn(const StyleCategory* 
         plan.kind = kSkipped;
     }
   }
+  if (plan.kind == kText || plan.kind == kNumber)
+    plan.quotedName = m_quotedNames.emplace_back(Json::Writer::Quote(key.GetView())).GetView();
   if (2 * (m_filled + 1) > m_slots.size()) {
     std::vector<Slot> slots(2 * m_slots.size());
     slots.swap(m_slots);

@@ -9,6 +9,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <deque>
 #include <string_view>
 #include <vector>
 
@@ -38,6 +39,7 @@ public:
     struct Plan {
       const BaseStyleProperty* behaviour;
       Kind kind;
+      std::u16string_view quotedName; // the key as Json::Writer::Quote gives it
     };
 
     TextScratch(const StyleSheet& sheet, bool includeTemporary)
@@ -63,7 +65,7 @@ public:
     struct Slot {
       const StyleCategory* category = nullptr;
       PropertyKey key;
-      Plan plan = {nullptr, kSkipped};
+      Plan plan = {nullptr, kSkipped, {}};
       bool filled = false;
     };
     static std::size_t Hash(const StyleCategory* category, const PropertyKey& key) {
@@ -77,6 +79,7 @@ public:
     const StyleSheet& m_sheet;
     bool m_includeTemporary;
     std::vector<Slot> m_slots = std::vector<Slot>(64); // half full at most
+    std::deque<ZelStringT<char16_t>> m_quotedNames;    // a deque never moves them
     std::size_t m_filled = 0;
   };
   // Writes the style's object as text.
