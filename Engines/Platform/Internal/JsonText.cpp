@@ -107,16 +107,27 @@ char16_t* WriteSpecial(char16_t c, const char16_t*& next, const char16_t* end, c
 
 char16_t* WriteQuoted(const char16_t* text, std::size_t length, char16_t* out) {
   *out++ = u'"';
+  const char16_t* const begin = text;
+  char16_t* const outBegin = out;
   const char16_t* const end = text + length;
   while (text != end) {
+    std::uint64_t units;
     if (end - text >= 4) {
-      std::uint64_t units;
       std::memcpy(&units, text, sizeof units);
       if (!NeedsCare(units)) {
         std::memcpy(out, &units, sizeof units);
         text += 4;
         out += 4;
         continue;
+      }
+    } else if (length >= 4 && out - outBegin == text - begin) {
+      // The last few units after a run copied as it is: the last four units,
+      // overlapping that run, are written again in one step.
+      std::memcpy(&units, end - 4, sizeof units);
+      if (!NeedsCare(units)) {
+        out += end - text;
+        std::memcpy(out - 4, &units, sizeof units);
+        break;
       }
     }
     const char16_t c = *text++;

@@ -59,6 +59,22 @@ private:
 // unpaired surrogates as U+FFFD, and returns the end of it.
 char16_t* WriteQuoted(const char16_t* text, std::size_t length, char16_t* out);
 
+// Copies `count` units to `out` a word at a time (a short copy that a call
+// to memcpy would cost more than) and returns the end of them.
+inline char16_t* CopyUnits(const char16_t* from, std::size_t count, char16_t* out) {
+  if (count < 4) {
+    for (std::size_t i = 0; i < count; ++i)
+      out[i] = from[i];
+    return out + count;
+  }
+  std::size_t i = 0;
+  for (; i + 4 <= count; i += 4)
+    std::memcpy(out + i, from + i, 8);
+  if (i < count) // the last word overlaps what is copied already
+    std::memcpy(out + count - 4, from + count - 4, 8);
+  return out + count;
+}
+
 // The compact layout: exactly the text the JSON library's compact writer gives
 // for the same calls (the same escapes, commas and colons), with unpaired
 // surrogates written as U+FFFD in the same pass. A call out of place (a value
@@ -105,8 +121,7 @@ public:
       if (member.quotedName.empty()) {
         out = WriteQuoted(member.name.data(), member.name.size(), out);
       } else {
-        std::memcpy(out, member.quotedName.data(), member.quotedName.size() * sizeof(char16_t));
-        out += member.quotedName.size();
+        out = CopyUnits(member.quotedName.data(), member.quotedName.size(), out);
       }
       *out++ = u':';
       out = WriteQuoted(member.text.data(), member.text.size(), out);

@@ -62,7 +62,8 @@ public:
   void Property(const Style& style, const StyleSheet& sheet, bool,
                 const PropertyMap::ConstEntry& entry) {
     const TextScratch::Plan plan = m_scratch.PlanFor(style.GetCategory().get(), entry.first);
-    if (plan.kind == TextScratch::kSkipped || Plain(plan, entry))
+    if (plan.kind == TextScratch::kSkipped || Plain(plan, entry) ||
+        Substyles(plan.kind, sheet, entry))
       return;
     if (plan.behaviour->Serialize(sheet, &style, entry.second, m_scratch.value)) {
       Flush();
@@ -82,6 +83,36 @@ private:
     if (m_pending == TextScratch::kBatch)
       Flush();
     m_scratch.pending[m_pending++] = member;
+  }
+  // Substyles of the stock behaviours, written straight as their objects:
+  // what Serialize gives, without a value tree. False for the general way.
+  bool Substyles(TextScratch::Kind kind, const StyleSheet& sheet,
+                 const PropertyMap::ConstEntry& entry) {
+    if (kind == TextScratch::kSubstyle) {
+      Style* const* substyle = entry.second.GetIf<Style*>();
+      if (!substyle)
+        return false;
+      Flush();
+      m_writer.Key(entry.first.GetView());
+      if (*substyle)
+        detail::StyleJson::Write(**substyle, sheet, m_writer, false, m_scratch);
+      else
+        m_writer.Write(Json::Value());
+      return true;
+    }
+    if (kind != TextScratch::kSubstyleList)
+      return false;
+    const auto* list = entry.second.GetIf<std::vector<Style*>>();
+    if (!list)
+      return false;
+    Flush();
+    m_writer.Key(entry.first.GetView());
+    m_writer.StartArray();
+    for (const Style* substyle : *list)
+      if (substyle)
+        detail::StyleJson::Write(*substyle, sheet, m_writer, false, m_scratch);
+    m_writer.EndArray();
+    return true;
   }
   // A plain property with a stock text or number policy: the member its
   // Serialize would give, without making a string or a value. False when the
@@ -153,10 +184,16 @@ StyleJson::TextScratch::Plan StyleJson::TextScratch::Learn(const StyleCategory* 
         else if (typeid(*policy) == typeid(ZelPref::NumberConversionPolicy))
           plan.kind = kNumber;
       }
-      // Such a value is left out of a document older than its behaviour.
-      if (plan.kind != kGeneral && m_sheet.GetVersion() < behaviour->GetMinimumVersion())
-        plan.kind = kSkipped;
+    } else if (!m_includeTemporary && typeid(*behaviour) == typeid(StyleSetProperty)) {
+      // Substyles are written without temporary values: the plans agree with
+      // that only when the whole export leaves them out.
+      plan.kind = kSubstyle;
+    } else if (!m_includeTemporary && typeid(*behaviour) == typeid(StyleArrayProperty)) {
+      plan.kind = kSubstyleList;
     }
+    // Such a value is left out of a document older than its behaviour.
+    if (plan.kind != kGeneral && m_sheet.GetVersion() < behaviour->GetMinimumVersion())
+      plan.kind = kSkipped;
   }
   if (plan.kind == kText || plan.kind == kNumber)
     plan.quotedName = m_quotedNames.emplace_back(Json::Writer::Quote(key.GetView())).GetView();

@@ -33,9 +33,10 @@ public:
   // written, found once (behaviours live unchanged through one export).
   class TextScratch {
   public:
-    enum Kind : unsigned char { kSkipped, kGeneral, kText, kNumber };
+    enum Kind : unsigned char { kSkipped, kGeneral, kText, kNumber, kSubstyle, kSubstyleList };
     // How a key's value is written: not at all, by its behaviour's Serialize,
-    // or as a plain text or number property of the stock policies.
+    // as a plain text or number property of the stock policies, or as the
+    // substyle or substyle list of the stock behaviours.
     struct Plan {
       const BaseStyleProperty* behaviour;
       Kind kind;
