@@ -107,8 +107,6 @@ char16_t* WriteSpecial(char16_t c, const char16_t*& next, const char16_t* end, c
 
 char16_t* WriteQuoted(const char16_t* text, std::size_t length, char16_t* out) {
   *out++ = u'"';
-  const char16_t* const begin = text;
-  char16_t* const outBegin = out;
   const char16_t* const end = text + length;
   while (text != end) {
     std::uint64_t units;
@@ -120,9 +118,9 @@ char16_t* WriteQuoted(const char16_t* text, std::size_t length, char16_t* out) {
         out += 4;
         continue;
       }
-    } else if (length >= 4 && out - outBegin == text - begin) {
-      // The last few units after a run copied as it is: the last four units,
-      // overlapping that run, are written again in one step.
+    } else if (length >= 4) {
+      // The last few units: when the last four need no care, the units before
+      // these few were copied as they are, so all four go in one step.
       std::memcpy(&units, end - 4, sizeof units);
       if (!NeedsCare(units)) {
         out += end - text;
@@ -150,7 +148,7 @@ bool CompactWriter::String(const char16_t* text, std::size_t length) {
 
 bool CompactWriter::Member(const char16_t* name, std::size_t nameLength, const char16_t* text,
                            std::size_t textLength) {
-  if (m_levels.empty() || m_levels.back().inArray || m_levels.back().valueCount % 2 != 0)
+  if (!AtName())
     return String(name, nameLength) && String(text, textLength);
   Level& level = m_levels.back();
   char16_t* out = m_out.Claim(6 + 6 * (nameLength + textLength));

@@ -100,7 +100,7 @@ public:
   // Members whose values are strings, each as Member writes it; a member
   // whose `quotedName` is not empty has that copied as its name.
   template <class StringMember> bool Members(const StringMember* members, std::size_t count) {
-    if (m_levels.empty() || m_levels.back().inArray || m_levels.back().valueCount % 2 != 0) {
+    if (!AtName()) {
       for (std::size_t i = 0; i < count; ++i)
         if (!Member(members[i].name.data(), members[i].name.size(), members[i].text.data(),
                     members[i].text.size()))
@@ -141,6 +141,10 @@ private:
     bool inArray;
   };
 
+  // True where a member's name belongs.
+  bool AtName() const {
+    return !m_levels.empty() && !m_levels.back().inArray && m_levels.back().valueCount % 2 == 0;
+  }
   // The separator before a value; false when a value cannot go here.
   bool Prefix(bool isString) {
     if (m_levels.empty())
