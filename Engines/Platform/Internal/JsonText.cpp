@@ -47,21 +47,8 @@ constexpr char16_t kHexDigits[] = u"0123456789ABCDEF";
 bool IsHighSurrogate(char16_t c) { return (c & 0xFC00) == 0xD800; }
 bool IsLowSurrogate(char16_t c) { return (c & 0xFC00) == 0xDC00; }
 
-// True when one of four units (in one word) may need more than a copy: a
-// control character, a quote, a backslash or a surrogate. A lane flags when
-// it is zero after the lane's test; a borrow only flags lanes above a true one.
-bool NeedsCare(std::uint64_t units) {
-  constexpr std::uint64_t kOnes = 0x0001000100010001ull;
-  constexpr std::uint64_t kHighs = 0x8000800080008000ull;
-  const auto hasZero = [](std::uint64_t x) { return (x - kOnes) & ~x & kHighs; };
-  const std::uint64_t control = (units - 0x20 * kOnes) & ~units & kHighs;
-  return (control | hasZero(units ^ (u'"' * kOnes)) | hasZero(units ^ (u'\\' * kOnes)) |
-          hasZero((units & (0xF800 * kOnes)) ^ (0xD800 * kOnes))) != 0;
-}
+} // namespace
 
-// Writes the unit `c` that needs more than a copy (a control character, a
-// quote, a backslash or a surrogate); `next` is the unit after it, which a
-// paired surrogate takes too. Returns the end of what was written.
 char16_t* WriteSpecial(char16_t c, const char16_t*& next, const char16_t* end, char16_t* out) {
   if (c >= 0xD800) {
     if (IsHighSurrogate(c) && next != end && IsLowSurrogate(*next)) {
@@ -100,41 +87,6 @@ char16_t* WriteSpecial(char16_t c, const char16_t*& next, const char16_t* end, c
     *out++ = kHexDigits[c >> 4];
     *out++ = kHexDigits[c & 0xF];
   }
-  return out;
-}
-
-} // namespace
-
-char16_t* WriteQuoted(const char16_t* text, std::size_t length, char16_t* out) {
-  *out++ = u'"';
-  const char16_t* const end = text + length;
-  while (text != end) {
-    std::uint64_t units;
-    if (end - text >= 4) {
-      std::memcpy(&units, text, sizeof units);
-      if (!NeedsCare(units)) {
-        std::memcpy(out, &units, sizeof units);
-        text += 4;
-        out += 4;
-        continue;
-      }
-    } else if (length >= 4) {
-      // The last few units: when the last four need no care, the units before
-      // these few were copied as they are, so all four go in one step.
-      std::memcpy(&units, end - 4, sizeof units);
-      if (!NeedsCare(units)) {
-        out += end - text;
-        std::memcpy(out - 4, &units, sizeof units);
-        break;
-      }
-    }
-    const char16_t c = *text++;
-    if (c >= 0x20 && c != u'"' && c != u'\\' && (c & 0xF800) != 0xD800)
-      *out++ = c;
-    else
-      out = WriteSpecial(c, text, end, out);
-  }
-  *out++ = u'"';
   return out;
 }
 

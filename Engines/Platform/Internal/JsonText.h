@@ -4,7 +4,11 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <cstring>
+#if defined(__SSE2__)
+#include <emmintrin.h>
+#endif
 #include <string>
 #include <vector>
 
@@ -55,9 +59,83 @@ private:
   std::size_t m_capacity = 0;
 };
 
+// True when one of four units (in one word) may need more than a copy: a
+// control character, a quote, a backslash or a surrogate. A lane flags when
+// it is zero after the lane's test; a borrow only flags lanes above a true one.
+inline bool NeedsCare(std::uint64_t units) {
+  constexpr std::uint64_t kOnes = 0x0001000100010001ull;
+  constexpr std::uint64_t kHighs = 0x8000800080008000ull;
+  const auto hasZero = [](std::uint64_t x) { return (x - kOnes) & ~x & kHighs; };
+  const std::uint64_t control = (units - 0x20 * kOnes) & ~units & kHighs;
+  return (control | hasZero(units ^ (u'"' * kOnes)) | hasZero(units ^ (u'\\' * kOnes)) |
+          hasZero((units & (0xF800 * kOnes)) ^ (0xD800 * kOnes))) != 0;
+}
+
+#if defined(__SSE2__)
+// The same test for eight units at `text`, in one vector.
+inline bool NeedsCare8(const char16_t* text) {
+  const __m128i units = _mm_loadu_si128(reinterpret_cast<const __m128i*>(text));
+  const __m128i control =
+      _mm_cmpeq_epi16(_mm_subs_epu16(units, _mm_set1_epi16(0x1F)), _mm_setzero_si128());
+  const __m128i quote = _mm_cmpeq_epi16(units, _mm_set1_epi16(u'"'));
+  const __m128i backslash = _mm_cmpeq_epi16(units, _mm_set1_epi16(u'\\'));
+  const __m128i surrogate =
+      _mm_cmpeq_epi16(_mm_and_si128(units, _mm_set1_epi16(static_cast<short>(0xF800))),
+                      _mm_set1_epi16(static_cast<short>(0xD800)));
+  return _mm_movemask_epi8(
+             _mm_or_si128(_mm_or_si128(control, quote), _mm_or_si128(backslash, surrogate))) != 0;
+}
+#endif
+
+// Writes the unit `c` that needs more than a copy (a control character, a
+// quote, a backslash or a surrogate); `next` is the unit after it, which a
+// paired surrogate takes too. Returns the end of what was written.
+char16_t* WriteSpecial(char16_t c, const char16_t*& next, const char16_t* end, char16_t* out);
+
 // Writes `text` quoted and escaped at `out` (room for 2 + 6 * length units),
-// unpaired surrogates as U+FFFD, and returns the end of it.
-char16_t* WriteQuoted(const char16_t* text, std::size_t length, char16_t* out);
+// unpaired surrogates as U+FFFD, and returns the end of it. Inline, so that a
+// run of members keeps its constants and loop in one place.
+inline char16_t* WriteQuoted(const char16_t* text, std::size_t length, char16_t* out) {
+  *out++ = u'"';
+  const char16_t* const end = text + length;
+  while (text != end) {
+#if defined(__SSE2__)
+    if (end - text >= 8 && !NeedsCare8(text)) {
+      _mm_storeu_si128(reinterpret_cast<__m128i*>(out),
+                       _mm_loadu_si128(reinterpret_cast<const __m128i*>(text)));
+      text += 8;
+      out += 8;
+      continue;
+    }
+#endif
+    std::uint64_t units;
+    if (end - text >= 4) {
+      std::memcpy(&units, text, sizeof units);
+      if (!NeedsCare(units)) {
+        std::memcpy(out, &units, sizeof units);
+        text += 4;
+        out += 4;
+        continue;
+      }
+    } else if (length >= 4) {
+      // The last few units: when the last four need no care, the units before
+      // these few were copied as they are, so all four go in one step.
+      std::memcpy(&units, end - 4, sizeof units);
+      if (!NeedsCare(units)) {
+        out += end - text;
+        std::memcpy(out - 4, &units, sizeof units);
+        break;
+      }
+    }
+    const char16_t c = *text++;
+    if (c >= 0x20 && c != u'"' && c != u'\\' && (c & 0xF800) != 0xD800)
+      *out++ = c;
+    else
+      out = WriteSpecial(c, text, end, out);
+  }
+  *out++ = u'"';
+  return out;
+}
 
 // Copies `count` units to `out` a word at a time (a short copy that a call
 // to memcpy would cost more than) and returns the end of them.
