@@ -552,6 +552,21 @@ TEST_F(StyleTest, JsonWritesFixedMembersFirstAndReadsDeprecatedLast) {
   EXPECT_EQ(x->GetParent(), nullptr);
   y->DeserializeJson(sheet, Parse(u"{\"inherits\":\"y\"}"));
   EXPECT_EQ(y->GetParent(), x);
+
+  // A document holds temporary values only when asked; substyles never do.
+  const PropertyKey scratchWidth =
+      border.Add(u"scratchWidth", new FlaggedNumberProperty('t', &log));
+  Style* z = new Style(nullptr, para.Key());
+  z->SetProperty(scratch, Any(1.0));
+  z->SetPathProperty({borderKey, scratchWidth}, Any(2.0));
+  sheet.AddStyle(u"z", z, false);
+  for (const bool includeTemporary : {false, true}) {
+    ZelStringT<char16_t> text;
+    sheet.ExportToString(text, includeTemporary);
+    EXPECT_EQ(text.GetView().find(u"\"scratch\":\"1\"") != std::u16string_view::npos,
+              includeTemporary);
+    EXPECT_EQ(text.GetView().find(u"scratchWidth"), std::u16string_view::npos);
+  }
 }
 
 } // namespace

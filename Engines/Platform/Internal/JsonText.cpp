@@ -3,23 +3,41 @@
 #include <algorithm>
 #include <cstdint>
 #include <cstring>
+#include <utility>
 
 namespace Json {
 namespace detail {
 
+void TextOutput::Adopt(std::u16string& storage) {
+  if (m_size > 0)
+    return;
+  // The old text is room to write over: sizing it again would fill it first.
+  m_text.swap(storage);
+  storage.clear();
+  m_units = m_text.data();
+  m_capacity = m_text.size();
+}
+
 std::u16string TextOutput::Take() {
-  std::u16string text(m_units.get(), m_size);
-  m_units.reset();
+  m_text.resize(m_size);
+  m_units = nullptr;
   m_size = m_capacity = 0;
-  return text;
+  return std::move(m_text);
+}
+
+void TextOutput::Expect(std::size_t count) {
+  m_text.reserve(m_size + count);
+  m_units = m_text.data();
 }
 
 void TextOutput::Grow(std::size_t count) {
-  const std::size_t capacity = std::max(m_capacity * 2, m_size + count + 1024);
-  std::unique_ptr<Ch[]> units(new Ch[capacity]);
-  std::copy(m_units.get(), m_units.get() + m_size, units.get());
-  m_units = std::move(units);
-  m_capacity = capacity;
+  // Sized a block past what is asked, within the capacity the string has;
+  // beyond it the string grows geometrically by itself.
+  constexpr std::size_t kBlock = 16384;
+  const std::size_t needed = m_size + count;
+  m_text.resize(std::max(needed, std::min(m_text.capacity(), m_size + count + kBlock)));
+  m_units = m_text.data();
+  m_capacity = m_text.size();
 }
 
 namespace {
@@ -29,21 +47,8 @@ constexpr char16_t kHexDigits[] = u"0123456789ABCDEF";
 bool IsHighSurrogate(char16_t c) { return (c & 0xFC00) == 0xD800; }
 bool IsLowSurrogate(char16_t c) { return (c & 0xFC00) == 0xDC00; }
 
-// True when one of four units (in one word) may need more than a copy: a
-// control character, a quote, a backslash or a surrogate. A lane flags when
-// it is zero after the lane's test; a borrow only flags lanes above a true one.
-bool NeedsCare(std::uint64_t units) {
-  constexpr std::uint64_t kOnes = 0x0001000100010001ull;
-  constexpr std::uint64_t kHighs = 0x8000800080008000ull;
-  const auto hasZero = [](std::uint64_t x) { return (x - kOnes) & ~x & kHighs; };
-  const std::uint64_t control = (units - 0x20 * kOnes) & ~units & kHighs;
-  return (control | hasZero(units ^ (u'"' * kOnes)) | hasZero(units ^ (u'\\' * kOnes)) |
-          hasZero((units & (0xF800 * kOnes)) ^ (0xD800 * kOnes))) != 0;
-}
+} // namespace
 
-// Writes the unit `c` that needs more than a copy (a control character, a
-// quote, a backslash or a surrogate); `next` is the unit after it, which a
-// paired surrogate takes too. Returns the end of what was written.
 char16_t* WriteSpecial(char16_t c, const char16_t*& next, const char16_t* end, char16_t* out) {
   if (c >= 0xD800) {
     if (IsHighSurrogate(c) && next != end && IsLowSurrogate(*next)) {
@@ -85,34 +90,6 @@ char16_t* WriteSpecial(char16_t c, const char16_t*& next, const char16_t* end, c
   return out;
 }
 
-// Writes `text` quoted and escaped at `out` (room for 2 + 6 * length units)
-// and returns the end of it.
-char16_t* WriteQuoted(const char16_t* text, std::size_t length, char16_t* out) {
-  *out++ = u'"';
-  const char16_t* const end = text + length;
-  while (text != end) {
-    if (end - text >= 4) {
-      std::uint64_t units;
-      std::memcpy(&units, text, sizeof units);
-      if (!NeedsCare(units)) {
-        std::memcpy(out, &units, sizeof units);
-        text += 4;
-        out += 4;
-        continue;
-      }
-    }
-    const char16_t c = *text++;
-    if (c >= 0x20 && c != u'"' && c != u'\\' && (c & 0xF800) != 0xD800)
-      *out++ = c;
-    else
-      out = WriteSpecial(c, text, end, out);
-  }
-  *out++ = u'"';
-  return out;
-}
-
-} // namespace
-
 bool CompactWriter::String(const char16_t* text, std::size_t length) {
   if (!Prefix(true))
     return false;
@@ -123,7 +100,7 @@ bool CompactWriter::String(const char16_t* text, std::size_t length) {
 
 bool CompactWriter::Member(const char16_t* name, std::size_t nameLength, const char16_t* text,
                            std::size_t textLength) {
-  if (m_levels.empty() || m_levels.back().inArray || m_levels.back().valueCount % 2 != 0)
+  if (!AtName())
     return String(name, nameLength) && String(text, textLength);
   Level& level = m_levels.back();
   char16_t* out = m_out.Claim(6 + 6 * (nameLength + textLength));

@@ -233,6 +233,21 @@ public:
     }
   }
 
+  bool WriteMembers(const Json::Writer::StringMember* members, std::size_t count) {
+    if constexpr (RepairsSurrogates<Writer>::value) {
+      for (std::size_t i = 0; i < count; ++i)
+        if (members[i].name.size() > std::numeric_limits<SizeType>::max() ||
+            members[i].text.size() > std::numeric_limits<SizeType>::max())
+          return false;
+      return m_writer.Members(members, count);
+    } else {
+      for (std::size_t i = 0; i < count; ++i)
+        if (!WriteMember(members[i].name, members[i].text))
+          return false;
+      return true;
+    }
+  }
+
   bool WriteText(std::u16string_view text, bool isKey) {
     if (text.size() > std::numeric_limits<SizeType>::max())
       return false;
@@ -635,6 +650,7 @@ struct Writer::Impl {
   virtual bool EndArray() = 0;
   virtual bool Text(std::u16string_view text, bool isKey) = 0;
   virtual bool Member(std::u16string_view name, std::u16string_view text) = 0;
+  virtual bool Members(const StringMember* members, std::size_t count) = 0;
   virtual bool Write(const Value& value) = 0;
   virtual bool IsComplete() const = 0;
 
@@ -657,6 +673,9 @@ template <class RapidWriter> struct WriterOf final : Writer::Impl {
   bool Text(std::u16string_view text, bool isKey) override { return tree.WriteText(text, isKey); }
   bool Member(std::u16string_view name, std::u16string_view text) override {
     return tree.WriteMember(name, text);
+  }
+  bool Members(const Writer::StringMember* members, std::size_t count) override {
+    return tree.WriteMembers(members, count);
   }
   bool Write(const Value& value) override { return tree.Write(value); }
   bool IsComplete() const override { return writer.IsComplete(); }
@@ -695,9 +714,21 @@ bool Writer::String(std::u16string_view text) {
 bool Writer::Member(std::u16string_view name, std::u16string_view text) {
   return Check(!m_impl->failed && m_impl->Member(name, text));
 }
+bool Writer::Members(const StringMember* members, std::size_t count) {
+  return Check(!m_impl->failed && m_impl->Members(members, count));
+}
 bool Writer::Write(const Value& value) { return Check(!m_impl->failed && m_impl->Write(value)); }
 
-void Writer::Reserve(std::size_t units) { m_impl->buffer.Reserve(units); }
+ZelStringT<char16_t> Writer::Quote(std::u16string_view text) {
+  std::u16string quoted(2 + 6 * text.size(), u'\0');
+  quoted.resize(static_cast<std::size_t>(
+      detail::WriteQuoted(text.data(), text.size(), quoted.data()) - quoted.data()));
+  return ZelStringT<char16_t>(std::move(quoted));
+}
+
+void Writer::Reserve(std::size_t units) { m_impl->buffer.Expect(units); }
+
+void Writer::ReuseStorage(ZelStringT<char16_t>& text) { m_impl->buffer.Adopt(text.GetStdString()); }
 
 ZelStringT<char16_t> Writer::TakeText() {
   Impl& impl = *m_impl;

@@ -373,10 +373,26 @@ public:
   bool String(std::u16string_view text);
   /// A member whose value is a string: the text of Key(name) then String(text).
   bool Member(std::u16string_view name, std::u16string_view text);
+  /// A member name and its string value, for Members.
+  struct StringMember {
+    std::u16string_view name; ///< The member's name.
+    std::u16string_view text; ///< Its string value.
+    /// Empty, or Quote(name): then the compact layout copies it as the name
+    /// instead of escaping the name again.
+    std::u16string_view quotedName = {};
+  };
+  /// `count` members in order, each as Member writes it, in one call.
+  bool Members(const StringMember* members, std::size_t count);
+  /// `text` as a JSON string: quoted and escaped, unpaired surrogates U+FFFD.
+  static ZelStringT<char16_t> Quote(std::u16string_view text);
   /// A whole value, containers included, as ValueToString writes it.
   bool Write(const Value& value);
   /// Makes room for `units` more UTF-16 units of text: a hint, never needed.
   void Reserve(std::size_t units);
+  /// Writes into the memory `text` holds, which it empties, so that text
+  /// written again and again into one string reuses it; TakeText hands it
+  /// back. Only before the first piece; later it does nothing.
+  void ReuseStorage(ZelStringT<char16_t>& text);
   /// The text once every container is closed; empty when a piece failed or
   /// the text is incomplete.
   ZelStringT<char16_t> TakeText();

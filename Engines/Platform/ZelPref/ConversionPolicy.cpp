@@ -95,21 +95,35 @@ ZelStringT<char16_t> Widen(const char* first, const char* last) {
 // The number of decimal digits of `value`.
 int DigitCount(unsigned long long value) {
   int count = 1;
-  while (value >= 10) {
-    value /= 10;
+  for (unsigned long long bound = 10; count < 20 && value >= bound; bound *= 10)
     ++count;
-  }
   return count;
 }
+
+// True when std::to_chars writes the whole number `value` (not zero) in the
+// exponent form, "1.2e+07", because it is shorter than its digits.
+bool ExponentIsShorter(unsigned long long value) {
+  const int digits = DigitCount(value);
+  while (value % 10 == 0)
+    value /= 10;
+  const int significant = DigitCount(value);
+  const int exponentDigits = digits - 1 >= 100 ? 3 : 2;
+  return digits > significant + (significant > 1 ? 1 : 0) + 2 + exponentDigits;
+}
+
+constexpr char kDigitPairs[] =
+    "00010203040506070809101112131415161718192021222324252627282930313233"
+    "34353637383940414243444546474849505152535455565758596061626364656667"
+    "6869707172737475767778798081828384858687888990919293949596979899";
 
 // std::to_chars' shortest text for the numbers documents mostly hold, whole
 // or with at most three decimals, without its general algorithm. Writes into
 // `out` (room for 32) and returns the end, or null for any other number.
-char* ShortDecimal(double value, char* out) {
+char16_t* ShortDecimal(double value, char16_t* out) {
   if (value == 0) {
     if (std::signbit(value))
-      *out++ = '-';
-    *out++ = '0';
+      *out++ = u'-';
+    *out++ = u'0';
     return out;
   }
   const double scaled = value * 1000.0;
@@ -123,46 +137,44 @@ char* ShortDecimal(double value, char* out) {
   // significant digits no shorter decimal reads back the same.
   if (static_cast<double>(thousandths) / 1000.0 != value)
     return nullptr;
-  unsigned long long magnitude = thousandths < 0
-                                     ? 0ull - static_cast<unsigned long long>(thousandths)
-                                     : static_cast<unsigned long long>(thousandths);
-  int decimals = 3;
-  while (decimals > 0 && magnitude % 10 == 0) {
-    magnitude /= 10;
-    --decimals;
-  }
-  const int digits = DigitCount(magnitude);
-  // to_chars writes the exponent form when it is shorter than the fixed one,
-  // which only a whole number ending in zeros can be.
-  if (decimals == 0) {
-    unsigned long long significant = magnitude;
-    while (significant % 10 == 0)
-      significant /= 10;
-    const int significantDigits = DigitCount(significant);
-    const int exponentDigits = digits - 1 >= 100 ? 3 : 2;
-    if (digits > significantDigits + (significantDigits > 1 ? 1 : 0) + 2 + exponentDigits)
-      return nullptr;
-  }
+  const unsigned long long magnitude = thousandths < 0
+                                           ? 0ull - static_cast<unsigned long long>(thousandths)
+                                           : static_cast<unsigned long long>(thousandths);
+  unsigned long long whole = magnitude / 1000;
+  const unsigned fraction = static_cast<unsigned>(magnitude % 1000);
+  // Only a whole number ending in zeros can be shorter in the exponent form.
+  if (fraction == 0 && whole >= 100000 && ExponentIsShorter(whole))
+    return nullptr;
   if (value < 0)
-    *out++ = '-';
-  // The digits from the last, the point after the first `decimals` of them;
-  // a value below one starts with "0." and any zeros before its digits.
-  char* end = out + digits + (decimals > 0);
-  if (decimals > 0 && digits <= decimals) {
-    *out++ = '0';
-    *out++ = '.';
-    for (int i = digits; i < decimals; ++i)
-      *out++ = '0';
-    end = out + digits;
+    *out++ = u'-';
+  // The whole part from its last digit, two at a time; then the three
+  // decimals without their trailing zeros.
+  char16_t* const end = out + DigitCount(whole);
+  char16_t* digit = end;
+  while (whole >= 100) {
+    const char* pair = kDigitPairs + 2 * (whole % 100);
+    whole /= 100;
+    *--digit = static_cast<char16_t>(pair[1]);
+    *--digit = static_cast<char16_t>(pair[0]);
   }
-  char* digit = end;
-  for (int k = 0; k < digits; ++k) {
-    if (k == decimals && k > 0)
-      *--digit = '.';
-    *--digit = static_cast<char>('0' + magnitude % 10);
-    magnitude /= 10;
+  if (whole >= 10) {
+    *--digit = static_cast<char16_t>(kDigitPairs[2 * whole + 1]);
+    *--digit = static_cast<char16_t>(kDigitPairs[2 * whole]);
+  } else {
+    *--digit = static_cast<char16_t>(u'0' + whole);
   }
-  return end;
+  if (fraction == 0)
+    return end;
+  char16_t* last = end;
+  *last++ = u'.';
+  *last++ = static_cast<char16_t>(u'0' + fraction / 100);
+  const unsigned rest = fraction % 100;
+  if (rest != 0) {
+    *last++ = static_cast<char16_t>(u'0' + rest / 10);
+    if (rest % 10 != 0)
+      *last++ = static_cast<char16_t>(u'0' + rest % 10);
+  }
+  return last;
 }
 
 } // namespace
@@ -181,10 +193,10 @@ ZelStringT<char16_t> NumberConversionPolicy::ToText(const ZelUtils::Any& value) 
 
 char16_t* NumberConversionPolicy::WriteText(double number, char16_t* out) noexcept {
   assert(std::isfinite(number));
+  if (char16_t* end = ShortDecimal(number, out))
+    return end;
   char buffer[kMaxTextLength];
-  const char* end = ShortDecimal(number, buffer);
-  if (!end)
-    end = std::to_chars(buffer, buffer + sizeof buffer, number).ptr;
+  const char* end = std::to_chars(buffer, buffer + sizeof buffer, number).ptr;
   for (const char* c = buffer; c != end; ++c)
     *out++ = static_cast<char16_t>(*c);
   return out;

@@ -22,13 +22,28 @@ namespace detail {
 
 namespace {
 
-// The filed styles by category (in key order), each list in name order.
-std::map<PropertyKey, std::vector<const StyleIndex::Entry*>>
-GroupByCategory(const StyleIndex& index) {
-  std::map<PropertyKey, std::vector<const StyleIndex::Entry*>> categories;
-  for (const StyleIndex::Entry* entry : index.Ordered())
-    if (entry->style)
-      categories[entry->style->GetCategoryName()].push_back(entry);
+using Groups = std::map<PropertyKey, std::vector<const StyleIndex::Entry*>>;
+
+// The filed styles by category (in key order), each list in name order, in
+// one pass over the styles; `units` receives a generous guess of the length
+// of their text.
+Groups GroupByCategory(const StyleIndex& index, std::size_t& units) {
+  Groups categories;
+  units = 64;
+  std::vector<const StyleIndex::Entry*>* group = nullptr;
+  PropertyKey groupKey;
+  for (const StyleIndex::Entry* entry : index.Ordered()) {
+    if (!entry->style)
+      continue;
+    // The map is searched only when the category differs from the last one.
+    const PropertyKey category = entry->style->GetCategoryName();
+    if (!group || category != groupKey) {
+      group = &categories[category];
+      groupKey = category;
+    }
+    group->push_back(entry);
+    units += entry->nameLength + 32 + 48 * entry->style->GetProperties().size();
+  }
   return categories;
 }
 
@@ -36,7 +51,8 @@ GroupByCategory(const StyleIndex& index) {
 
 void DocumentWriter::WriteTree(const StyleSheet& sheet, JsonValue& out, bool includeTemporary) {
   Json::Object& document = out.Get<Json::Object>();
-  const auto categories = GroupByCategory(*sheet.m_index);
+  std::size_t units = 0;
+  const Groups categories = GroupByCategory(*sheet.m_index, units);
   if (sheet.m_version > 0)
     document.AddValue(k_strVersion, Json::Value(sheet.m_version));
   if (!sheet.m_externalID.IsEmpty())
@@ -56,13 +72,11 @@ void DocumentWriter::WriteTree(const StyleSheet& sheet, JsonValue& out, bool inc
 void DocumentWriter::WriteText(const StyleSheet& sheet, ZelStringT<char16_t>& text,
                                bool includeTemporary) {
   // The same text as ExportJson's tree would give, written without the tree.
-  const auto categories = GroupByCategory(*sheet.m_index);
   // A generous guess of the text's length saves the text's growth steps.
-  std::size_t estimate = 64;
-  for (const auto& group : categories)
-    for (const StyleIndex::Entry* entry : group.second)
-      estimate += entry->nameLength + 32 + 48 * entry->style->GetProperties().size();
+  std::size_t estimate = 0;
+  const Groups categories = GroupByCategory(*sheet.m_index, estimate);
   Json::Writer writer(false);
+  writer.ReuseStorage(text);
   writer.Reserve(estimate);
   writer.StartObject();
   if (sheet.m_version > 0) {
@@ -73,7 +87,7 @@ void DocumentWriter::WriteText(const StyleSheet& sheet, ZelStringT<char16_t>& te
     writer.Key(k_strExternalID);
     writer.String(sheet.m_externalID.GetView());
   }
-  StyleJson::TextScratch scratch;
+  StyleJson::TextScratch scratch(sheet, includeTemporary);
   for (const auto& [category, entries] : categories) {
     writer.Key(category.GetView());
     writer.StartObject();

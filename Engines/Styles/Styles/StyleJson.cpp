@@ -36,60 +36,112 @@ public:
   void Text(std::u16string_view name, std::u16string_view text) {
     m_object.AddValue(ZelStringT<char16_t>(name), Json::Value(ZelStringT<char16_t>(text)));
   }
-  Json::Value& Value() { return m_value = Json::Value(); }
-  void Member(const ZelStringT<char16_t>& name) { m_object.AddValue(name, std::move(m_value)); }
-  bool Plain(const BaseStyleProperty&, const StyleSheet&, const ZelUtils::Any&,
-             const PropertyKey&) {
-    return false;
+  void Property(const Style& style, const StyleSheet& sheet, bool includeTemporary,
+                const PropertyMap::ConstEntry& entry) {
+    const StyleCategory* category = style.GetCategory().get();
+    const BaseStyleProperty* behaviour =
+        category ? category->GetStyleProperty(entry.first) : nullptr;
+    if (!behaviour || (!includeTemporary && behaviour->IsTemporary()))
+      return;
+    Json::Value value;
+    if (behaviour->Serialize(sheet, &style, entry.second, value))
+      m_object.AddValue(entry.first.GetString(), std::move(value));
   }
 
 private:
   Json::Object& m_object;
-  Json::Value m_value;
 };
 
-// The same members written straight into JSON text.
+// The same members written straight into JSON text. Members whose values are
+// strings wait in the scratch and go to the writer together.
 class WriterSink {
 public:
-  WriterSink(Json::Writer& writer, detail::StyleJson::TextScratch& scratch)
-      : m_writer(writer), m_scratch(scratch) {}
-  void Text(std::u16string_view name, std::u16string_view text) { m_writer.Member(name, text); }
-  Json::Value& Value() { return m_scratch.value; }
-  void Member(const ZelStringT<char16_t>& name) {
-    m_writer.Key(name.GetView());
-    m_writer.Write(m_scratch.value);
-  }
-  // A plain property with a stock text or number policy: the member its
-  // Serialize would give, written without making a string or a value. False
-  // when the general way must be taken (it also throws what Serialize throws).
-  bool Plain(const BaseStyleProperty& behaviour, const StyleSheet& sheet,
-             const ZelUtils::Any& value, const PropertyKey& name) {
-    using Kind = detail::StyleJson::TextScratch::Kind;
-    const Kind kind = m_scratch.KindOf(behaviour);
-    if (kind == Kind::kGeneral)
-      return false;
-    if (sheet.GetVersion() < behaviour.GetMinimumVersion())
-      return true;
-    if (kind == Kind::kText) {
-      const auto* text = value.GetIf<ZelStringT<char16_t>>();
-      if (!text)
-        return false;
-      m_writer.Member(name.GetView(), text->GetView());
-      return true;
+  using TextScratch = detail::StyleJson::TextScratch;
+  WriterSink(Json::Writer& writer, TextScratch& scratch) : m_writer(writer), m_scratch(scratch) {}
+  void Text(std::u16string_view name, std::u16string_view text) { Add({name, text}); }
+  void Property(const Style& style, const StyleSheet& sheet, bool,
+                const PropertyMap::ConstEntry& entry) {
+    const TextScratch::Plan plan = m_scratch.PlanFor(style.GetCategory().get(), entry.first);
+    if (plan.kind == TextScratch::kSkipped || Plain(plan, entry) ||
+        Substyles(plan.kind, sheet, entry))
+      return;
+    if (plan.behaviour->Serialize(sheet, &style, entry.second, m_scratch.value)) {
+      Flush();
+      m_writer.Key(entry.first.GetView());
+      m_writer.Write(m_scratch.value);
     }
-    const double* number = value.GetIf<double>();
-    if (!number || !std::isfinite(*number))
-      return false;
-    char16_t digits[ZelPref::NumberConversionPolicy::kMaxTextLength];
-    const char16_t* end = ZelPref::NumberConversionPolicy::WriteText(*number, digits);
-    m_writer.Member(name.GetView(),
-                    std::u16string_view(digits, static_cast<std::size_t>(end - digits)));
-    return true;
+  }
+  // Writes the members still waiting.
+  void Flush() {
+    if (m_pending > 0)
+      m_writer.Members(m_scratch.pending, m_pending);
+    m_pending = 0;
   }
 
 private:
+  void Add(const Json::Writer::StringMember& member) {
+    if (m_pending == TextScratch::kBatch)
+      Flush();
+    m_scratch.pending[m_pending++] = member;
+  }
+  // Substyles of the stock behaviours, written straight as their objects:
+  // what Serialize gives, without a value tree. False for the general way.
+  bool Substyles(TextScratch::Kind kind, const StyleSheet& sheet,
+                 const PropertyMap::ConstEntry& entry) {
+    if (kind == TextScratch::kSubstyle) {
+      Style* const* substyle = entry.second.GetIf<Style*>();
+      if (!substyle)
+        return false;
+      Flush();
+      m_writer.Key(entry.first.GetView());
+      if (*substyle)
+        detail::StyleJson::Write(**substyle, sheet, m_writer, false, m_scratch);
+      else
+        m_writer.Write(Json::Value());
+      return true;
+    }
+    if (kind != TextScratch::kSubstyleList)
+      return false;
+    const auto* list = entry.second.GetIf<std::vector<Style*>>();
+    if (!list)
+      return false;
+    Flush();
+    m_writer.Key(entry.first.GetView());
+    m_writer.StartArray();
+    for (const Style* substyle : *list)
+      if (substyle)
+        detail::StyleJson::Write(*substyle, sheet, m_writer, false, m_scratch);
+    m_writer.EndArray();
+    return true;
+  }
+  // A plain property with a stock text or number policy: the member its
+  // Serialize would give, without making a string or a value. False when the
+  // general way must be taken (it also throws what Serialize throws).
+  bool Plain(const TextScratch::Plan& plan, const PropertyMap::ConstEntry& entry) {
+    if (plan.kind == TextScratch::kText) {
+      const auto* text = entry.second.GetIf<ZelStringT<char16_t>>();
+      if (!text)
+        return false;
+      Add({entry.first.GetView(), text->GetView(), plan.quotedName});
+      return true;
+    }
+    if (plan.kind != TextScratch::kNumber)
+      return false;
+    const double* number = entry.second.GetIf<double>();
+    if (!number || !std::isfinite(*number))
+      return false;
+    if (m_pending == TextScratch::kBatch)
+      Flush();
+    char16_t* digits = m_scratch.digits[m_pending];
+    const char16_t* end = ZelPref::NumberConversionPolicy::WriteText(*number, digits);
+    m_scratch.pending[m_pending++] = {
+        entry.first.GetView(), {digits, static_cast<std::size_t>(end - digits)}, plan.quotedName};
+    return true;
+  }
+
   Json::Writer& m_writer;
-  detail::StyleJson::TextScratch& m_scratch;
+  TextScratch& m_scratch;
+  std::size_t m_pending = 0;
 };
 
 } // namespace
@@ -106,15 +158,8 @@ void StyleJson::WriteMembers(const Style& style, const StyleSheet& sheet, bool i
     sink.Text(k_strExternalID, style.GetExternalID().GetView());
   if (!style.GetExternalName().IsEmpty())
     sink.Text(k_strExternalName, style.GetExternalName().GetView());
-  for (const PropertyMap::ConstEntry& entry : style.GetProperties()) {
-    const BaseStyleProperty* behaviour = style.FindBehaviour(entry.first);
-    if (!behaviour || (!includeTemporary && behaviour->IsTemporary()))
-      continue;
-    if (sink.Plain(*behaviour, sheet, entry.second, entry.first))
-      continue;
-    if (behaviour->Serialize(sheet, &style, entry.second, sink.Value()))
-      sink.Member(entry.first.GetString());
-  }
+  for (const PropertyMap::ConstEntry& entry : style.GetProperties())
+    sink.Property(style, sheet, includeTemporary, entry);
 }
 
 void StyleJson::Write(const Style& style, const StyleSheet& sheet, JsonValue& out,
@@ -125,31 +170,52 @@ void StyleJson::Write(const Style& style, const StyleSheet& sheet, JsonValue& ou
   WriteMembers(style, sheet, includeTemporary, sink);
 }
 
-StyleJson::TextScratch::Kind StyleJson::TextScratch::KindOf(const BaseStyleProperty& behaviour) {
-  // Addresses are multiples of the allocation alignment; mix the bits.
-  std::size_t slot = static_cast<std::size_t>(
-      (reinterpret_cast<std::uintptr_t>(&behaviour) >> 4) * 0x9E3779B97F4A7C15ull >> 58);
-  for (std::size_t probe = 0; probe < kSlots; ++probe, slot = (slot + 1) % kSlots) {
-    if (m_behaviours[slot] == &behaviour)
-      return m_kinds[slot];
-    if (!m_behaviours[slot])
-      break;
-  }
-  // Only an exact StyleProperty is known to write what its policy gives.
-  Kind kind = kGeneral;
-  if (typeid(behaviour) == typeid(StyleProperty)) {
-    if (const ZelPref::ConversionPolicy* policy = behaviour.GetConversionPolicy()) {
-      if (typeid(*policy) == typeid(ZelPref::TextConversionPolicy))
-        kind = kText;
-      else if (typeid(*policy) == typeid(ZelPref::NumberConversionPolicy))
-        kind = kNumber;
+StyleJson::TextScratch::Plan StyleJson::TextScratch::Learn(const StyleCategory* category,
+                                                           const PropertyKey& key) {
+  const BaseStyleProperty* behaviour = category ? category->GetStyleProperty(key) : nullptr;
+  Plan plan{behaviour, kSkipped, {}};
+  if (behaviour && (m_includeTemporary || !behaviour->IsTemporary())) {
+    plan.kind = kGeneral;
+    // Only an exact StyleProperty is known to write what its policy gives.
+    if (typeid(*behaviour) == typeid(StyleProperty)) {
+      if (const ZelPref::ConversionPolicy* policy = behaviour->GetConversionPolicy()) {
+        if (typeid(*policy) == typeid(ZelPref::TextConversionPolicy))
+          plan.kind = kText;
+        else if (typeid(*policy) == typeid(ZelPref::NumberConversionPolicy))
+          plan.kind = kNumber;
+      }
+    } else if (!m_includeTemporary && typeid(*behaviour) == typeid(StyleSetProperty)) {
+      // Substyles are written without temporary values: the plans agree with
+      // that only when the whole export leaves them out.
+      plan.kind = kSubstyle;
+    } else if (!m_includeTemporary && typeid(*behaviour) == typeid(StyleArrayProperty)) {
+      plan.kind = kSubstyleList;
     }
+    // Such a value is left out of a document older than its behaviour.
+    if (plan.kind != kGeneral && m_sheet.GetVersion() < behaviour->GetMinimumVersion())
+      plan.kind = kSkipped;
   }
-  if (!m_behaviours[slot]) {
-    m_behaviours[slot] = &behaviour;
-    m_kinds[slot] = kind;
+  if (plan.kind == kText || plan.kind == kNumber)
+    plan.quotedName = m_quotedNames.emplace_back(Json::Writer::Quote(key.GetView())).GetView();
+  if (2 * (m_filled + 1) > m_slots.size()) {
+    std::vector<Slot> slots(2 * m_slots.size());
+    slots.swap(m_slots);
+    m_filled = 0;
+    for (const Slot& slot : slots)
+      if (slot.filled)
+        Place(slot);
   }
-  return kind;
+  Place(Slot{category, key, plan, true});
+  return plan;
+}
+
+void StyleJson::TextScratch::Place(const Slot& slot) {
+  const std::size_t mask = m_slots.size() - 1;
+  std::size_t i = Hash(slot.category, slot.key) & mask;
+  while (m_slots[i].filled)
+    i = (i + 1) & mask;
+  m_slots[i] = slot;
+  ++m_filled;
 }
 
 void StyleJson::Write(const Style& style, const StyleSheet& sheet, Json::Writer& writer,
@@ -157,6 +223,7 @@ void StyleJson::Write(const Style& style, const StyleSheet& sheet, Json::Writer&
   writer.StartObject();
   WriterSink sink(writer, scratch);
   WriteMembers(style, sheet, includeTemporary, sink);
+  sink.Flush();
   writer.EndObject();
 }
 

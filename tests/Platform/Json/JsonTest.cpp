@@ -149,7 +149,9 @@ TEST(JsonTest, CompactStringsAreEscapedExactly) {
 }
 
 // Pieces out of place lose the whole text, as an unfinished one does. Steps:
-// { } [ ] open and close, k a name, s a string, m both, n a number.
+// { } [ ] open and close, k a name, s a string, m both, M two such members
+// (one with its name quoted already), n a number. Each writer writes over a
+// longer text it is handed.
 TEST(JsonTest, WriterRefusesPiecesOutOfPlace) {
   struct Case {
     const char* steps;
@@ -160,9 +162,14 @@ TEST(JsonTest, WriterRefusesPiecesOutOfPlace) {
         Case{"{k{}k[]}", u"{\"k\":{},\"k\":[]}"}, Case{"{mkn}", u"{\"k\":\"s\",\"k\":1}"},
         Case{"[m]", u"[\"k\",\"s\"]"}, Case{"{kmn}", u"{\"k\":\"k\",\"s\":1}"}, Case{"{n}", u""},
         Case{"{k}", u""}, Case{"{k[}", u""}, Case{"[}", u""}, Case{"{]", u""}, Case{"ss", u""},
-        Case{"[", u""}, Case{"}", u""}, Case{"", u""}}) {
+        Case{"[", u""}, Case{"}", u""}, Case{"", u""}, Case{"{M}", u"{\"k\":\"s\",\"q\\\"uoted\":\"t\"}"},
+        Case{"[M]", u"[\"k\",\"s\",\"q\\\"uoted\",\"t\"]"}, Case{"{kM}", u""}}) {
     SCOPED_TRACE(c.steps);
+    const Text quoted = Json::Writer::Quote(u"q\"uoted");
+    const Json::Writer::StringMember members[] = {{u"k", u"s"}, {u"q\"uoted", u"t", quoted}};
+    Text storage(u"a longer text that the writer writes over");
     Json::Writer writer(false);
+    writer.ReuseStorage(storage);
     for (const char* step = c.steps; *step; ++step) {
       switch (*step) {
       case '{':
@@ -185,6 +192,9 @@ TEST(JsonTest, WriterRefusesPiecesOutOfPlace) {
         break;
       case 'm':
         writer.Member(u"k", u"s");
+        break;
+      case 'M':
+        writer.Members(members, 2);
         break;
       default:
         writer.Write(Value(1));

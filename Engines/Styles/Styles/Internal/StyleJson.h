@@ -8,7 +8,10 @@
 #include <Json/Json.h>
 
 #include <cstddef>
+#include <cstdint>
+#include <deque>
 #include <string_view>
+#include <vector>
 
 namespace Styles {
 namespace detail {
@@ -43,20 +46,60 @@ public:
   static void Write(const Style& style, const StyleSheet& sheet, JsonValue& out,
                     bool includeTemporary);
   // What writing a document's styles as text keeps from one style to the
-  // next: a value reused for members, and how each behaviour met is written,
-  // found once by its type (behaviours live unchanged through one export).
+  // next: a value reused for members, the plain members waiting to be written
+  // in one call, and how the value under each key of each category is
+  // written, found once (behaviours live unchanged through one export).
   class TextScratch {
   public:
-    enum Kind : unsigned char { kUnknown, kGeneral, kText, kNumber };
+    enum Kind : unsigned char { kSkipped, kGeneral, kText, kNumber, kSubstyle, kSubstyleList };
+    // How a key's value is written: not at all, by its behaviour's Serialize,
+    // as a plain text or number property of the stock policies, or as the
+    // substyle or substyle list of the stock behaviours.
+    struct Plan {
+      const BaseStyleProperty* behaviour;
+      Kind kind;
+      std::u16string_view quotedName; // the key as Json::Writer::Quote gives it
+    };
+
+    TextScratch(const StyleSheet& sheet, bool includeTemporary)
+        : m_sheet(sheet), m_includeTemporary(includeTemporary) {}
+    // The plan for `key` in a style of `category` (null for none).
+    Plan PlanFor(const StyleCategory* category, const PropertyKey& key) {
+      const std::size_t mask = m_slots.size() - 1;
+      for (std::size_t i = Hash(category, key) & mask;; i = (i + 1) & mask) {
+        const Slot& slot = m_slots[i];
+        if (!slot.filled)
+          return Learn(category, key);
+        if (slot.category == category && slot.key == key)
+          return slot.plan;
+      }
+    }
+
     JsonValue value;
-    // How `behaviour` is written: by its Serialize, or as a plain text or
-    // number property of the stock policies.
-    Kind KindOf(const BaseStyleProperty& behaviour);
+    static constexpr std::size_t kBatch = 32;
+    Json::Writer::StringMember pending[kBatch];
+    char16_t digits[kBatch][32];
 
   private:
-    static constexpr std::size_t kSlots = 64;
-    const BaseStyleProperty* m_behaviours[kSlots] = {};
-    Kind m_kinds[kSlots] = {};
+    struct Slot {
+      const StyleCategory* category = nullptr;
+      PropertyKey key;
+      Plan plan = {nullptr, kSkipped, {}};
+      bool filled = false;
+    };
+    static std::size_t Hash(const StyleCategory* category, const PropertyKey& key) {
+      const auto bits = reinterpret_cast<std::uintptr_t>(category) ^ key.getHash();
+      return static_cast<std::size_t>(((bits >> 4) * 0x9E3779B97F4A7C15ull) >> 40);
+    }
+    // Finds the plan of a key met for the first time and files it.
+    Plan Learn(const StyleCategory* category, const PropertyKey& key);
+    void Place(const Slot& slot);
+
+    const StyleSheet& m_sheet;
+    bool m_includeTemporary;
+    std::vector<Slot> m_slots = std::vector<Slot>(64); // half full at most
+    std::deque<ZelStringT<char16_t>> m_quotedNames;    // a deque never moves them
+    std::size_t m_filled = 0;
   };
   // Writes the style's object as text.
   static void Write(const Style& style, const StyleSheet& sheet, Json::Writer& writer,
