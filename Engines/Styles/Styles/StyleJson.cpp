@@ -62,7 +62,7 @@ public:
   void Property(const Style& style, const StyleSheet& sheet, bool,
                 const PropertyMap::ConstEntry& entry) {
     const TextScratch::Plan plan = m_scratch.PlanFor(style.GetCategory().get(), entry.first);
-    if (plan.kind == TextScratch::kSkipped || Plain(plan, entry) ||
+    if (!plan.behaviour || Plain(plan, entry) ||
         Substyles(plan.kind, sheet, entry))
       return;
     if (plan.behaviour->Serialize(sheet, &style, entry.second, m_scratch.value)) {
@@ -86,9 +86,9 @@ private:
   }
   // Substyles of the stock behaviours, written straight as their objects:
   // what Serialize gives, without a value tree. False for the general way.
-  bool Substyles(TextScratch::Kind kind, const StyleSheet& sheet,
+  bool Substyles(detail::StyleJson::Kind kind, const StyleSheet& sheet,
                  const PropertyMap::ConstEntry& entry) {
-    if (kind == TextScratch::kSubstyle) {
+    if (kind == detail::StyleJson::kSubstyle) {
       Style* const* substyle = entry.second.GetIf<Style*>();
       if (!substyle)
         return false;
@@ -100,7 +100,7 @@ private:
         m_writer.Write(Json::Value());
       return true;
     }
-    if (kind != TextScratch::kSubstyleList)
+    if (kind != detail::StyleJson::kSubstyleList)
       return false;
     const auto* list = entry.second.GetIf<std::vector<Style*>>();
     if (!list)
@@ -118,14 +118,14 @@ private:
   // Serialize would give, without making a string or a value. False when the
   // general way must be taken (it also throws what Serialize throws).
   bool Plain(const TextScratch::Plan& plan, const PropertyMap::ConstEntry& entry) {
-    if (plan.kind == TextScratch::kText) {
+    if (plan.kind == detail::StyleJson::kText) {
       const auto* text = entry.second.GetIf<ZelStringT<char16_t>>();
       if (!text)
         return false;
       Add({entry.first.GetView(), text->GetView(), plan.quotedName});
       return true;
     }
-    if (plan.kind != TextScratch::kNumber)
+    if (plan.kind != detail::StyleJson::kNumber)
       return false;
     const double* number = entry.second.GetIf<double>();
     if (!number || !std::isfinite(*number))
@@ -173,29 +173,18 @@ void StyleJson::Write(const Style& style, const StyleSheet& sheet, JsonValue& ou
 StyleJson::TextScratch::Plan StyleJson::TextScratch::Learn(const StyleCategory* category,
                                                            const PropertyKey& key) {
   const BaseStyleProperty* behaviour = category ? category->GetStyleProperty(key) : nullptr;
-  Plan plan{behaviour, kSkipped, {}};
+  Plan plan{nullptr, kGeneral, {}};
   if (behaviour && (m_includeTemporary || !behaviour->IsTemporary())) {
-    plan.kind = kGeneral;
-    // Only an exact StyleProperty is known to write what its policy gives.
-    if (typeid(*behaviour) == typeid(StyleProperty)) {
-      if (const ZelPref::ConversionPolicy* policy = behaviour->GetConversionPolicy()) {
-        if (typeid(*policy) == typeid(ZelPref::TextConversionPolicy))
-          plan.kind = kText;
-        else if (typeid(*policy) == typeid(ZelPref::NumberConversionPolicy))
-          plan.kind = kNumber;
-      }
-    } else if (!m_includeTemporary && typeid(*behaviour) == typeid(StyleSetProperty)) {
-      // Substyles are written without temporary values: the plans agree with
-      // that only when the whole export leaves them out.
-      plan.kind = kSubstyle;
-    } else if (!m_includeTemporary && typeid(*behaviour) == typeid(StyleArrayProperty)) {
-      plan.kind = kSubstyleList;
-    }
+    plan.kind = StyleJson::KindOf(*behaviour);
+    // Substyles are written without temporary values: writing them straight
+    // agrees with that only when the whole export leaves them out.
+    if (m_includeTemporary && (plan.kind == kSubstyle || plan.kind == kSubstyleList))
+      plan.kind = kGeneral;
     // Such a value is left out of a document older than its behaviour.
-    if (plan.kind != kGeneral && m_sheet.GetVersion() < behaviour->GetMinimumVersion())
-      plan.kind = kSkipped;
+    if (plan.kind == kGeneral || m_sheet.GetVersion() >= behaviour->GetMinimumVersion())
+      plan.behaviour = behaviour;
   }
-  if (plan.kind == kText || plan.kind == kNumber)
+  if (plan.behaviour && (plan.kind == kText || plan.kind == kNumber))
     plan.quotedName = m_quotedNames.emplace_back(Json::Writer::Quote(key.GetView())).GetView();
   if (2 * (m_filled + 1) > m_slots.size()) {
     std::vector<Slot> slots(2 * m_slots.size());
@@ -227,7 +216,24 @@ void StyleJson::Write(const Style& style, const StyleSheet& sheet, Json::Writer&
   writer.EndObject();
 }
 
-StyleJson::ReadScratch::Kind StyleJson::ReadScratch::KindOf(const BaseStyleProperty& behaviour) {
+StyleJson::Kind StyleJson::KindOf(const BaseStyleProperty& behaviour) {
+  const std::type_info& type = typeid(behaviour);
+  // Only the exact stock types are known to do what their policy gives.
+  if (type == typeid(StyleProperty)) {
+    if (const ZelPref::ConversionPolicy* policy = behaviour.GetConversionPolicy()) {
+      if (typeid(*policy) == typeid(ZelPref::TextConversionPolicy))
+        return kText;
+      if (typeid(*policy) == typeid(ZelPref::NumberConversionPolicy))
+        return kNumber;
+    }
+    return kGeneral;
+  }
+  if (type == typeid(StyleSetProperty))
+    return kSubstyle;
+  return type == typeid(StyleArrayProperty) ? kSubstyleList : kGeneral;
+}
+
+StyleJson::Kind StyleJson::ReadScratch::KindOf(const BaseStyleProperty& behaviour) {
   // Addresses are multiples of the allocation alignment; mix the bits.
   std::size_t slot = static_cast<std::size_t>(
       (reinterpret_cast<std::uintptr_t>(&behaviour) >> 4) * 0x9E3779B97F4A7C15ull >> 58);
@@ -237,20 +243,7 @@ StyleJson::ReadScratch::Kind StyleJson::ReadScratch::KindOf(const BaseStylePrope
     if (!m_behaviours[slot])
       break;
   }
-  Kind kind = kGeneral;
-  const std::type_info& type = typeid(behaviour);
-  if (type == typeid(StyleProperty)) {
-    if (const ZelPref::ConversionPolicy* policy = behaviour.GetConversionPolicy()) {
-      if (typeid(*policy) == typeid(ZelPref::TextConversionPolicy))
-        kind = kText;
-      else if (typeid(*policy) == typeid(ZelPref::NumberConversionPolicy))
-        kind = kNumber;
-    }
-  } else if (type == typeid(StyleSetProperty)) {
-    kind = kSubstyle;
-  } else if (type == typeid(StyleArrayProperty)) {
-    kind = kSubstyleList;
-  }
+  const Kind kind = StyleJson::KindOf(behaviour);
   if (!m_behaviours[slot]) {
     m_behaviours[slot] = &behaviour;
     m_kinds[slot] = kind;
@@ -277,12 +270,12 @@ FixedMember FixedMemberOf(std::u16string_view name) {
 // kNumber) as its Deserialize would: its values own nothing and need no
 // adjustment. False when the general way must be taken: for other kinds, and
 // for a number the policy rejects.
-bool ReadPlain(StyleJson::ReadScratch::Kind kind, const BaseStyleProperty& behaviour,
+bool ReadPlain(StyleJson::Kind kind, const BaseStyleProperty& behaviour,
                PropertyMap& properties, std::u16string_view text) {
   ZelUtils::Any value;
-  if (kind == StyleJson::ReadScratch::kText) {
+  if (kind == StyleJson::kText) {
     value = ZelUtils::Any(ZelStringT<char16_t>(text));
-  } else if (kind == StyleJson::ReadScratch::kNumber) {
+  } else if (kind == StyleJson::kNumber) {
     try {
       value = behaviour.GetConversionPolicy()->FromText(ZelStringT<char16_t>(text));
     } catch (const ZelPref::Detail::BadConversion&) {
@@ -300,10 +293,10 @@ bool ReadPlain(StyleJson::ReadScratch::Kind kind, const BaseStyleProperty& behav
 } // namespace
 
 template <class Access>
-bool StyleJson::ReadSubstyles(ReadScratch::Kind kind, const BaseStyleProperty& behaviour,
+bool StyleJson::ReadSubstyles(Kind kind, const BaseStyleProperty& behaviour,
                               Style& style, const StyleSheet& sheet, typename Access::Value value,
                               ReadScratch& scratch) {
-  if (kind == ReadScratch::kSubstyle) {
+  if (kind == kSubstyle) {
     const auto object = Access::AsObject(value);
     if (!object)
       return false;
@@ -315,7 +308,7 @@ bool StyleJson::ReadSubstyles(ReadScratch::Kind kind, const BaseStyleProperty& b
       substyle.release();
     return true;
   }
-  if (kind != ReadScratch::kSubstyleList)
+  if (kind != kSubstyleList)
     return false;
   const auto array = Access::AsArray(value);
   if (!array)
@@ -384,7 +377,7 @@ void StyleJson::Read(Style& style, const StyleSheet& sheet, const typename Acces
         deprecated.emplace_back(behaviour, value);
         continue;
       }
-      const ReadScratch::Kind kind = scratch.KindOf(*behaviour);
+      const Kind kind = scratch.KindOf(*behaviour);
       const std::optional<std::u16string_view> text = Access::AsString(value);
       if (text && ReadPlain(kind, *behaviour, style.m_properties, *text))
         continue;

@@ -18,17 +18,19 @@ namespace detail {
 
 class StyleJson {
 public:
+  // What a behaviour is known to read and write without its virtual calls:
+  // kText or kNumber for an exact StyleProperty with the stock text or number
+  // policy, kSubstyle and kSubstyleList for an exact StyleSetProperty and
+  // StyleArrayProperty; kGeneral for any other.
+  enum Kind : unsigned char { kGeneral, kText, kNumber, kSubstyle, kSubstyleList };
+  static Kind KindOf(const BaseStyleProperty& behaviour);
+
   // What reading styles keeps from one style to the next: a value reused for
-  // members, and how each behaviour met reads a string value, found once by
-  // its type (behaviours live unchanged through one import).
+  // members, and the kind of each behaviour met, found once (behaviours live
+  // unchanged through one import).
   class ReadScratch {
   public:
-    enum Kind : unsigned char { kUnknown, kGeneral, kText, kNumber, kSubstyle, kSubstyleList };
     JsonValue value;
-    // How a behaviour's Deserialize is known to read: kText or kNumber for an
-    // exact StyleProperty with the stock text or number policy, kSubstyle and
-    // kSubstyleList for an exact StyleSetProperty and StyleArrayProperty;
-    // kGeneral for any other.
     Kind KindOf(const BaseStyleProperty& behaviour);
 
   private:
@@ -51,10 +53,8 @@ public:
   // written, found once (behaviours live unchanged through one export).
   class TextScratch {
   public:
-    enum Kind : unsigned char { kSkipped, kGeneral, kText, kNumber, kSubstyle, kSubstyleList };
-    // How a key's value is written: not at all, by its behaviour's Serialize,
-    // as a plain text or number property of the stock policies, or as the
-    // substyle or substyle list of the stock behaviours.
+    // How a key's value is written: not at all (no behaviour), or as its
+    // behaviour's kind says.
     struct Plan {
       const BaseStyleProperty* behaviour;
       Kind kind;
@@ -84,7 +84,7 @@ public:
     struct Slot {
       const StyleCategory* category = nullptr;
       PropertyKey key;
-      Plan plan = {nullptr, kSkipped, {}};
+      Plan plan = {nullptr, kGeneral, {}};
       bool filled = false;
     };
     static std::size_t Hash(const StyleCategory* category, const PropertyKey& key) {
@@ -110,7 +110,7 @@ private:
   // does, read from the object or array where it is. False for a value of
   // another form, which the general way takes.
   template <class Access>
-  static bool ReadSubstyles(ReadScratch::Kind kind, const BaseStyleProperty& behaviour,
+  static bool ReadSubstyles(Kind kind, const BaseStyleProperty& behaviour,
                             Style& style, const StyleSheet& sheet, typename Access::Value value,
                             ReadScratch& scratch);
   // Hands the members of the style's object to `sink`, in their order.
